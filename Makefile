@@ -1,0 +1,31 @@
+# The commands of the README. `make check` is what CI runs.
+PRESETS := default asan tsan
+
+.PHONY: all deps check build bench fuzz clean $(addprefix check-,$(PRESETS))
+
+all: build
+
+deps:
+	@bash scripts/install-deps
+
+build: deps
+	cmake --preset default
+	cmake --build --preset default
+
+check: deps $(addprefix check-,$(PRESETS))
+
+check-%:
+	cmake --preset $*
+	cmake --build --preset $*
+	ctest --preset $*
+
+bench: build
+	@for b in build/default/bench/*Bench; do echo "== $$b"; $$b || exit 1; done
+
+fuzz: deps
+	cmake --preset fuzz
+	cmake --build --preset fuzz
+	@for f in build/fuzz/fuzz/*Fuzz; do echo "== $$f"; $$f -max_total_time=60 fuzz/corpus/$$(basename $$f) || exit 1; done
+
+clean:
+	rm -rf build
