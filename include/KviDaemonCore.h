@@ -1,0 +1,16 @@
+/* libKviDaemonCore: everything a daemon or a plug-in reaches of the library.
+ * Include this header alone; it compiles as C11 and as C++20. */
+#ifndef KVI_DAEMON_CORE_H
+#define KVI_DAEMON_CORE_H
+
+#include "SaHpi.h"
+#include "kvi/KviExport.h"
+#include "kvi/KviConfig.h"
+#include "kvi/KviLogging.h"
+#include "kvi/KviMemory.h"
+#include "kvi/KviRwLock.h"
+#include "kvi/KviSemaphore.h"
+#include "kvi/KviThread.h"
+#include "kvi/KviTime.h"
+
+#endif
