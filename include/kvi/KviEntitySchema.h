@@ -1,0 +1,4 @@
+/* Placeholder until this unit's public interface is written. */
+#ifndef KVI_ENTITY_SCHEMA_H
+#define KVI_ENTITY_SCHEMA_H
+#endif
