@@ -11,11 +11,18 @@
 #ifdef __cplusplus
 #define KVI_EXTERN_C_BEGIN extern "C" {
 #define KVI_EXTERN_C_END }
-#define KVI_NOEXCEPT noexcept
 #else
 #define KVI_EXTERN_C_BEGIN
 #define KVI_EXTERN_C_END
+#endif
+
+/* SaHpi.h defines the same, so that it stands alone. */
+#ifndef KVI_NOEXCEPT
+#ifdef __cplusplus
+#define KVI_NOEXCEPT noexcept
+#else
 #define KVI_NOEXCEPT
+#endif
 #endif
 
 /* Exported functions are declared with KVI_API so C sees a plain prototype and
