@@ -22,8 +22,14 @@ KviCsRwLockT *sharedLock()
 
 pthread_rwlock_t posixLock = PTHREAD_RWLOCK_INITIALIZER;
 
-void openLog(const benchmark::State &) { kviCsLogInitialize(KVI_LOG_INFO_NUM, "/dev/null"); }
-void closeLog(const benchmark::State &) { kviCsLogClose(); }
+void openLog(const benchmark::State &)
+{
+    kviCsLogInitialize(KVI_LOG_INFO_NUM, "/dev/null");
+}
+void closeLog(const benchmark::State &)
+{
+    kviCsLogClose();
+}
 
 void BM_KviRwLockRead(benchmark::State &state)
 {
