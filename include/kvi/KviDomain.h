@@ -1,4 +1,22 @@
-/* Placeholder until this unit's public interface is written. */
+/* The domain the library serves. Only the default domain (0) exists; its
+ * resource presence table is the one of KviRpt.h. */
 #ifndef KVI_DOMAIN_H
 #define KVI_DOMAIN_H
+
+#include "SaHpi.h"
+#include "kvi/KviExport.h"
+#include "kvi/KviRpt.h"
+
+KVI_EXTERN_C_BEGIN
+
+/* Sets up the default domain and its empty table; once per process. */
+KVI_API SaErrorT kviCsDomainInitialize(void) KVI_NOEXCEPT;
+KVI_API SaErrorT kviCsGetRptContainerByDomainId(SaHpiDomainIdT DomainId,
+                                                KviCsRptContainerT **RptContainer) KVI_NOEXCEPT;
+/* Always the single domain 0; a ListSize of 0 reports the needed size. */
+KVI_API SaErrorT kviCsGetDomainList(SaHpiUint32T ListSize, SaHpiDomainIdT *DomainList,
+                                    SaHpiUint32T *NumDomains) KVI_NOEXCEPT;
+
+KVI_EXTERN_C_END
+
 #endif
