@@ -12,6 +12,7 @@
 #include "kvi/KviMaplInterface.h"
 #include "kvi/KviMemory.h"
 #include "kvi/KviNonVolatile.h"
+#include "kvi/KviParmControl.h"
 #include "kvi/KviRdr.h"
 #include "kvi/KviRpt.h"
 #include "kvi/KviRwLock.h"
