@@ -5,11 +5,13 @@
 
 #include "SaHpi.h"
 #include "kvi/KviExport.h"
+#include "kvi/KviApiRedirector.h"
 #include "kvi/KviConfig.h"
 #include "kvi/KviDomain.h"
 #include "kvi/KviEntitySchema.h"
 #include "kvi/KviLogging.h"
 #include "kvi/KviMaplInterface.h"
+#include "kvi/KviMaplManager.h"
 #include "kvi/KviMemory.h"
 #include "kvi/KviNonVolatile.h"
 #include "kvi/KviParmControl.h"
