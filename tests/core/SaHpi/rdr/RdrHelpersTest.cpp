@@ -1,0 +1,157 @@
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "core/SaHpi/rpt/RptTestSupport.h"
+#include "support/KviTestSupport.h"
+
+namespace
+{
+using Ids = std::vector<SaHpiEntryIdT>;
+
+std::vector<SaHpiEntryIdT> cleaned;
+SaErrorT cleanupResult = SA_OK;
+
+SaErrorT recordCleanup(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRdrT *Rdr, void *, KviDsRdrFnTable *)
+{
+    cleaned.push_back(Rdr->RecordId);
+    return cleanupResult;
+}
+
+// A resource with records 1 to 5, each with a recording cleanup except 4.
+class RdrHelpersTest : public ResourceModelTest
+{
+  protected:
+    void SetUp() override
+    {
+        ResourceModelTest::SetUp();
+        cleaned.clear();
+        cleanupResult = SA_OK;
+        rid_ = addResource(SAHPI_FALSE);
+        KviDsRdrFnTable table{};
+        table.RdrResourcesRemove = recordCleanup;
+        for (SaHpiEntryIdT id = 1; id <= 5; id++)
+            addRdr(rid_, SAHPI_SENSOR_RDR, id == 4 ? KviDsRdrFnTable{} : table);
+    }
+    SaHpiResourceIdT rid_ = 0;
+
+    static Ids walk(KviCsRdrRepositoryContainerT *Repo)
+    {
+        Ids ids;
+        SaHpiEntryIdT next = SAHPI_FIRST_ENTRY;
+        while (kviCsRdrGetNextEntry(Repo, next, &next) == SA_OK && next != SAHPI_LAST_ENTRY)
+            ids.push_back(next);
+        return ids;
+    }
+};
+
+TEST_F(RdrHelpersTest, WalkStepsAndItsRefusals)
+{
+    withRepository(rid_, [](KviCsRdrRepositoryContainerT *repo) {
+        EXPECT_EQ(walk(repo), (Ids{3, 1, 4, 2, 5}));
+        SaHpiEntryIdT next = 0;
+        KviLogCapture log(KVI_LOG_DBG_L_NUM);
+        EXPECT_EQ(kviCsRdrGetNextEntry(repo, SAHPI_LAST_ENTRY, &next), SA_ERR_HPI_INVALID_PARAMS);
+        EXPECT_EQ(kviCsRdrGetNextEntry(repo, 8, &next), SA_ERR_HPI_NOT_PRESENT);
+        EXPECT_EQ(kviCsRdrGetNextEntry(nullptr, 1, &next), SA_ERR_HPI_INVALID_PARAMS);
+        EXPECT_EQ(kviCsRdrGetNextEntry(repo, 1, nullptr), SA_ERR_HPI_INVALID_PARAMS);
+        EXPECT_TRUE(log.contains("RdrContainerToSearch pointer is NULL."));
+        EXPECT_TRUE(log.contains("NextEntryId pointer is NULL."));
+    });
+    addResource(SAHPI_FALSE); // 2, without records
+    withRepository(2, [](KviCsRdrRepositoryContainerT *repo) {
+        SaHpiEntryIdT next = 0;
+        EXPECT_EQ(kviCsRdrGetNextEntry(repo, SAHPI_FIRST_ENTRY, &next), SA_ERR_HPI_INVALID_REQUEST);
+        EXPECT_EQ(kviCsRdrGetNextEntry(repo, 1, &next), SA_ERR_HPI_NOT_PRESENT);
+    });
+}
+
+TEST_F(RdrHelpersTest, LookupsFindRecordsByRecordId)
+{
+    withRepository(rid_, [](KviCsRdrRepositoryContainerT *repo) {
+        KviCsRdrContainerT *record = nullptr;
+        ASSERT_EQ(kviCsRdrGetRdrContainer(repo, 4, &record), SA_OK);
+        EXPECT_EQ(record->Rdr.RecordId, 4u);
+        EXPECT_EQ(kviCsRdrGetRdrContainer(repo, 6, &record), SA_ERR_HPI_NOT_PRESENT);
+        EXPECT_EQ(kviCsRdrGetRdrContainer(nullptr, 4, &record), SA_ERR_HPI_INVALID_PARAMS);
+        EXPECT_EQ(kviCsRdrGetRdrContainer(repo, 4, nullptr), SA_ERR_HPI_INVALID_PARAMS);
+        KviCsLinkedListNodeT *node = nullptr;
+        ASSERT_EQ(kviCsRdrGetNodeFromLinkedList(&repo->RdrList[1], 4, &node), SA_OK);
+        EXPECT_EQ(node->Data, record);
+        EXPECT_EQ(kviCsRdrGetNodeFromLinkedList(&repo->RdrList[0], 4, &node),
+                  SA_ERR_HPI_NOT_PRESENT);
+        EXPECT_EQ(kviCsRdrGetNodeFromLinkedList(nullptr, 4, &node), SA_ERR_HPI_INVALID_PARAMS);
+    });
+}
+
+TEST_F(RdrHelpersTest, RemovingOneRecordCallsItsCleanupIfItHasOne)
+{
+    withRepository(rid_, [this](KviCsRdrRepositoryContainerT *repo) {
+        KviLogCapture log(KVI_LOG_DBG_L_NUM);
+        EXPECT_EQ(kviCsRdrGivenRepositoryRemoveEntry(0, rid_, repo, SAHPI_LAST_ENTRY),
+                  SA_ERR_HPI_INVALID_PARAMS);
+        EXPECT_TRUE(log.contains("EntryId can't be SAHPI_LAST_ENTRY"));
+        EXPECT_EQ(kviCsRdrGivenRepositoryRemoveEntry(0, rid_, repo, 9), SA_ERR_HPI_NOT_PRESENT);
+        EXPECT_TRUE(log.contains("Request to remove entry 9, but can't find that entry"));
+        EXPECT_EQ(kviCsRdrGivenRepositoryRemoveEntry(0, rid_, nullptr, 1),
+                  SA_ERR_HPI_INVALID_PARAMS);
+
+        // The first of the walk, then one by id, then one without cleanup.
+        ASSERT_EQ(kviCsRdrGivenRepositoryRemoveEntry(0, rid_, repo, SAHPI_FIRST_ENTRY), SA_OK);
+        ASSERT_EQ(kviCsRdrGivenRepositoryRemoveEntry(0, rid_, repo, 2), SA_OK);
+        ASSERT_EQ(kviCsRdrGivenRepositoryRemoveEntry(0, rid_, repo, 4), SA_OK);
+        EXPECT_TRUE(log.contains("Calling RdrResourcesRemove function pointer"));
+        EXPECT_TRUE(log.contains("Function Pointer is NULL, no user function to call"));
+        EXPECT_EQ(cleaned, (Ids{3, 2}));
+        EXPECT_EQ(walk(repo), (Ids{1, 5}));
+
+        cleanupResult = SA_ERR_HPI_ERROR;
+        ASSERT_EQ(kviCsRdrGivenRepositoryRemoveEntry(0, rid_, repo, 5), SA_OK);
+        EXPECT_TRUE(log.contains("User Cleanup returned -1001 for resource " +
+                                 std::to_string(rid_) + ", record 5"));
+        EXPECT_EQ(walk(repo), (Ids{1}));
+    });
+}
+
+TEST_F(RdrHelpersTest, RepositoryLifecycle)
+{
+    SaHpiInt32T blocks = liveBlocks();
+    KviCsRdrRepositoryContainerT repo{};
+    ASSERT_EQ(kviCsRdrRepositoryContainerInitialize(&repo), SA_OK);
+    EXPECT_EQ(repo.HashSize, 3u);
+    EXPECT_EQ(repo.NextRecordId, 1u);
+    EXPECT_EQ(repo.DefaultEirId, 0);
+    EXPECT_EQ(repo.DefaultWatchdogNum, 0);
+    EXPECT_EQ(liveBlocks(), blocks + 1) << "the lists are one block";
+    ASSERT_EQ(kviCsRdrRepositoryRemove(0, 1, &repo), SA_OK);
+    EXPECT_EQ(liveBlocks(), blocks);
+
+    KviLogCapture log(KVI_LOG_DBG_L_NUM);
+    kviCsMemoryFailNthAllocation(1);
+    EXPECT_EQ(kviCsRdrRepositoryContainerInitialize(&repo), SA_ERR_HPI_OUT_OF_SPACE);
+    kviCsMemoryFailNthAllocation(0);
+    EXPECT_TRUE(log.contains("Unable to allocate memory for the RDR's linked list"));
+    EXPECT_EQ(kviCsRdrRepositoryContainerInitialize(nullptr), SA_ERR_HPI_INVALID_PARAMS);
+    EXPECT_TRUE(log.contains("RdrRepositoryContainer pointer is NULL."));
+    EXPECT_EQ(kviCsRdrRepositoryRemove(0, 1, nullptr), SA_ERR_HPI_INVALID_PARAMS);
+    EXPECT_EQ(liveBlocks(), blocks);
+}
+
+TEST_F(RdrHelpersTest, RemovingTheRepositoryCleansEveryRecordOnce)
+{
+    withRepository(rid_, [this](KviCsRdrRepositoryContainerT *repo) {
+        cleanupResult = SA_ERR_HPI_ERROR; // a plug-in's failure does not stop the removal
+        ASSERT_EQ(kviCsRdrRepositoryRemove(0, rid_, repo), SA_OK);
+        EXPECT_EQ(cleaned, (Ids{3, 1, 2, 5}));
+        EXPECT_EQ(repo->RdrList, nullptr);
+    });
+    // The emptied resource goes without calling anything again.
+    cleaned.clear();
+    KviCsRptContainerT *rpt = nullptr;
+    ASSERT_EQ(kviCsRptLockRpt(0, &rpt), SA_OK);
+    EXPECT_EQ(kviCsRptEntryRemoveByRidNoLock(0, rid_, rpt), SA_OK);
+    kviCsRptUnlockRpt(rpt);
+    EXPECT_TRUE(cleaned.empty());
+}
+
+} // namespace

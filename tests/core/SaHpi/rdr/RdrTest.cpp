@@ -1,0 +1,421 @@
+#include <map>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "core/SaHpi/rpt/RptTestSupport.h"
+#include "support/KviTestSupport.h"
+
+namespace
+{
+using Ids = std::vector<SaHpiEntryIdT>;
+
+// Runs first: nothing works before the store is set up, and it is set up once.
+TEST(RdrInitTest, RefusesEverythingUntilInitializedOnce)
+{
+    KviLogCapture log(KVI_LOG_DBG_L_NUM);
+    SaHpiRdrT rdr = makeRdr(SAHPI_SENSOR_RDR);
+    KviDsRdrFnTable table{};
+    SaHpiEntryIdT recordId = 0;
+    KviCsRdrRecordNumT number{};
+    SaHpiBoolT active = SAHPI_FALSE;
+    SaHpiEirIdT eir = 0;
+    SaHpiUint32T size = 0;
+    EXPECT_EQ(kviCsRdrAdd(0, 1, &rdr, nullptr, &table, &recordId, &number),
+              SA_ERR_HPI_INVALID_REQUEST);
+    EXPECT_EQ(kviCsRdrGet(0, 1, SAHPI_NO_RECORD, SAHPI_FIRST_ENTRY, nullptr, &rdr, &active,
+                          nullptr, nullptr, nullptr, nullptr),
+              SA_ERR_HPI_INVALID_REQUEST);
+    EXPECT_EQ(kviCsDefaultEirGet(0, 1, &eir), SA_ERR_HPI_INVALID_REQUEST);
+    EXPECT_TRUE(log.contains("Rdr not yet initialized"));
+    EXPECT_NE(kviCsRdrHashSizeGet(&size), SA_OK);
+    EXPECT_NE(kviCsRdrHashSizeSet(4), SA_OK);
+    EXPECT_TRUE(log.contains("The RDR GlobalHashSizeSemaphore has not been initialized. "));
+
+    // A resource needs its repository, which needs the store.
+    ASSERT_EQ(kviCsDomainInitialize(), SA_OK);
+    KviDsRptFnTable rptTable{};
+    SaHpiResourceIdT id = 0;
+    EXPECT_EQ(kviCsRptEntryAdd(0, makeRptEntry(), nullptr, SAHPI_FALSE, &rptTable, kTestMapl,
+                               testLock(), &id),
+              SA_ERR_HPI_ERROR);
+    EXPECT_TRUE(log.contains("Unable to retrieve hash size, failing"));
+
+    ASSERT_EQ(kviCsRdrInitialize(), SA_OK);
+    EXPECT_EQ(kviCsRdrInitialize(), SA_ERR_HPI_DUPLICATE);
+    EXPECT_TRUE(log.contains("kviCsRdrIniitalize called multiple times"));
+    ASSERT_EQ(kviCsRdrHashSizeGet(&size), SA_OK);
+    EXPECT_EQ(size, static_cast<SaHpiUint32T>(KVI_CS_DEFAULT_RDR_HASH_SIZE));
+}
+
+// Records go to one resource the fixture adds inactive with every kind of
+// record among its capabilities.
+class RdrTest : public ResourceModelTest
+{
+  protected:
+    void SetUp() override
+    {
+        ResourceModelTest::SetUp();
+        rid_ = addResource(SAHPI_FALSE);
+    }
+    SaHpiResourceIdT rid_ = 0;
+
+    SaHpiUint32T nextRecordId(SaHpiResourceIdT Rid)
+    {
+        SaHpiUint32T next = 0;
+        withRepository(Rid, [&](KviCsRdrRepositoryContainerT *repo) { next = repo->NextRecordId; });
+        return next;
+    }
+
+    // The record ids a client walking the resource's records sees.
+    Ids walk()
+    {
+        Ids ids;
+        SaHpiEntryIdT next = SAHPI_FIRST_ENTRY;
+        while (next != SAHPI_LAST_ENTRY) {
+            SaHpiRdrT rdr{};
+            SaHpiBoolT active = SAHPI_FALSE;
+            if (kviCsRdrGet(0, rid_, SAHPI_NO_RECORD, next, &next, &rdr, &active, nullptr,
+                            nullptr, nullptr, nullptr) != SA_OK)
+                break;
+            ids.push_back(rdr.RecordId);
+        }
+        return ids;
+    }
+
+    SaErrorT get(SaHpiRdrTypeT Type, SaHpiEntryIdT EntryId, SaHpiRdrT *Rdr = nullptr)
+    {
+        SaHpiBoolT active = SAHPI_FALSE;
+        return kviCsRdrGet(0, rid_, Type, EntryId, nullptr, Rdr, &active, nullptr, nullptr,
+                           nullptr, nullptr);
+    }
+};
+
+TEST_F(RdrTest, NumberIsTheLowByteOfTheRecordIdWhateverThePluginSet)
+{
+    for (SaHpiRdrTypeT type :
+         {SAHPI_CTRL_RDR, SAHPI_SENSOR_RDR, SAHPI_INVENTORY_RDR, SAHPI_WATCHDOG_RDR}) {
+        SCOPED_TRACE(type);
+        SaHpiRdrT rdr = makeRdr(type);
+        rdr.RecordId = 77;
+        rdr.RdrTypeUnion.CtrlRec.Num = 77; // the number field of every kind sits first
+        KviDsRdrFnTable table{};
+        SaHpiEntryIdT recordId = 0;
+        KviCsRdrRecordNumT number{};
+        number.SensorNum = 77;
+        ASSERT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, &recordId, &number), SA_OK);
+        SaHpiUint8T expected = static_cast<SaHpiUint8T>(type);
+        EXPECT_EQ(recordId, SaHpiEntryIdT(type));
+        EXPECT_EQ(rdr.RecordId, recordId);
+        switch (type) {
+        case SAHPI_CTRL_RDR:
+            EXPECT_EQ(rdr.RdrTypeUnion.CtrlRec.Num, expected);
+            EXPECT_EQ(number.ControlNum, expected);
+            break;
+        case SAHPI_SENSOR_RDR:
+            EXPECT_EQ(rdr.RdrTypeUnion.SensorRec.Num, expected);
+            EXPECT_EQ(number.SensorNum, expected);
+            break;
+        case SAHPI_INVENTORY_RDR:
+            EXPECT_EQ(rdr.RdrTypeUnion.InventoryRec.EirId, expected);
+            EXPECT_EQ(number.EirNum, expected);
+            break;
+        default:
+            EXPECT_EQ(rdr.RdrTypeUnion.WatchdogRec.WatchdogNum, expected);
+            EXPECT_EQ(number.WatchdogNum, expected);
+        }
+        SaHpiRdrT stored{};
+        ASSERT_EQ(get(type, recordId, &stored), SA_OK);
+        EXPECT_EQ(stored.RecordId, recordId);
+        EXPECT_EQ(stored.RdrTypeUnion.CtrlRec.Num, expected);
+    }
+    for (SaHpiEntryIdT id = 5; id < 256; id++)
+        addRdr(rid_, SAHPI_SENSOR_RDR);
+    SaHpiRdrT rdr = makeRdr(SAHPI_SENSOR_RDR);
+    KviDsRdrFnTable table{};
+    SaHpiEntryIdT recordId = 0;
+    KviCsRdrRecordNumT number{};
+    ASSERT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, &recordId, &number), SA_OK);
+    EXPECT_EQ(recordId, 256u);
+    EXPECT_EQ(number.SensorNum, 0);
+    EXPECT_EQ(rdr.RdrTypeUnion.SensorRec.Num, 0);
+}
+
+TEST_F(RdrTest, WalkGoesByListThenAgeAndIgnoresTypes)
+{
+    for (SaHpiRdrTypeT type : {SAHPI_CTRL_RDR, SAHPI_SENSOR_RDR, SAHPI_INVENTORY_RDR,
+                               SAHPI_WATCHDOG_RDR, SAHPI_SENSOR_RDR})
+        addRdr(rid_, type);
+    EXPECT_EQ(walk(), (Ids{3, 1, 4, 2, 5}));
+    // A typed read names the next record of any type.
+    SaHpiEntryIdT next = 0;
+    SaHpiBoolT active = SAHPI_TRUE;
+    ASSERT_EQ(kviCsRdrGet(0, rid_, SAHPI_SENSOR_RDR, 2, &next, nullptr, &active, nullptr, nullptr,
+                          nullptr, nullptr),
+              SA_OK);
+    EXPECT_EQ(next, 5u);
+    EXPECT_FALSE(active);
+    ASSERT_EQ(kviCsRdrGet(0, rid_, SAHPI_SENSOR_RDR, 5, &next, nullptr, &active, nullptr, nullptr,
+                          nullptr, nullptr),
+              SA_OK);
+    EXPECT_EQ(next, SAHPI_LAST_ENTRY);
+}
+
+TEST_F(RdrTest, ActiveResourcesTakeNoRecordsAndSpendNoId)
+{
+    addRdr(rid_, SAHPI_SENSOR_RDR);
+    ASSERT_EQ(kviCsRptEntryActiveStateSetByRid(0, rid_, SAHPI_TRUE), SA_OK);
+    SaHpiRdrT rdr = makeRdr(SAHPI_SENSOR_RDR);
+    KviDsRdrFnTable table{};
+    SaHpiEntryIdT recordId = 0;
+    KviCsRdrRecordNumT number{};
+    KviLogCapture log(KVI_LOG_DBG_L_NUM);
+    EXPECT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, &recordId, &number),
+              SA_ERR_HPI_INVALID_REQUEST);
+    EXPECT_TRUE(log.contains("Can't add entries to active resources"));
+    EXPECT_EQ(nextRecordId(rid_), 2u);
+    EXPECT_EQ(walk(), (Ids{1}));
+}
+
+TEST_F(RdrTest, InvalidTypesAreRefusedButSpendTheirId)
+{
+    KviLogCapture log(KVI_LOG_DBG_L_NUM);
+    for (int type : {int(SAHPI_NO_RECORD), 5}) {
+        SaHpiRdrT rdr = makeRdr(static_cast<SaHpiRdrTypeT>(type));
+        KviDsRdrFnTable table{};
+        SaHpiEntryIdT recordId = 0;
+        KviCsRdrRecordNumT number{};
+        EXPECT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, &recordId, &number),
+                  SA_ERR_HPI_INVALID_PARAMS);
+        EXPECT_EQ(rdr.RecordId, 0u);
+        EXPECT_EQ(recordId, 0u);
+        EXPECT_TRUE(log.contains("RdrType is invalid (" + std::to_string(type) + ")"));
+    }
+    EXPECT_EQ(addRdr(rid_, SAHPI_CTRL_RDR), 3u);
+    EXPECT_EQ(walk(), (Ids{3}));
+}
+
+TEST_F(RdrTest, LookupsCheckTheResourcesCapabilitiesThenTheRecordsType)
+{
+    addRdr(rid_, SAHPI_SENSOR_RDR);
+    addRdr(rid_, SAHPI_CTRL_RDR);
+    KviLogCapture log(KVI_LOG_DBG_L_NUM);
+    EXPECT_EQ(get(SAHPI_SENSOR_RDR, 2), SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_TRUE(log.contains("RDR entry type (1) does not match requested type (2)"));
+    EXPECT_TRUE(log.contains("Rdr entry is not the correct type"));
+    EXPECT_EQ(get(SAHPI_NO_RECORD, 2), SA_OK);
+    EXPECT_EQ(get(SAHPI_CTRL_RDR, 9), SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_EQ(get(static_cast<SaHpiRdrTypeT>(9), 1), SA_ERR_HPI_INVALID_CMD);
+    EXPECT_TRUE(log.contains("Unknown RDR type (9)"));
+
+    // A resource without any record capability is asked for none of them.
+    rid_ = addResource(SAHPI_TRUE, kTestMapl, KviDsRptFnTable{}, nullptr, testLock(),
+                       makeRptEntry(SAHPI_CAPABILITY_RESOURCE));
+    SaHpiBoolT active = SAHPI_FALSE;
+    EXPECT_EQ(kviCsRdrGetWatchdog(0, rid_, 1, nullptr, &active, nullptr, nullptr, nullptr,
+                                  nullptr),
+              SA_ERR_HPI_INVALID_CMD);
+    EXPECT_EQ(kviCsRdrGetSensor(0, rid_, 1, nullptr, &active, nullptr, nullptr, nullptr, nullptr),
+              SA_ERR_HPI_INVALID_CMD);
+    EXPECT_EQ(kviCsRdrGetControl(0, rid_, 1, nullptr, &active, nullptr, nullptr, nullptr,
+                                 nullptr),
+              SA_ERR_HPI_INVALID_CMD);
+    EXPECT_EQ(kviCsRdrGetEir(0, rid_, 1, nullptr, &active, nullptr, nullptr, nullptr, nullptr),
+              SA_ERR_HPI_INVALID_CMD);
+    for (const char *line :
+         {"Resource does not support watchdogs", "Resource does not support sensors",
+          "Resource does not support controls", "Resource does not support entity inventory"})
+        EXPECT_TRUE(log.contains(line)) << line;
+    EXPECT_EQ(get(SAHPI_NO_RECORD, SAHPI_FIRST_ENTRY), SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_TRUE(log.contains("No Entries found."));
+}
+
+TEST_F(RdrTest, ReadsHandOutWhatIsNeededToCallThePlugin)
+{
+    int user = 0;
+    KviDsRdrFnTable table{};
+    table.WatchdogTimerReset = [](SaHpiDomainIdT, SaHpiResourceIdT, SaHpiWatchdogNumT,
+                                  void *) -> SaErrorT { return SA_OK; };
+    addRdr(rid_, SAHPI_WATCHDOG_RDR, table, &user);
+    SaHpiRdrT rdr{};
+    SaHpiBoolT active = SAHPI_TRUE;
+    void *userOut = nullptr;
+    KviDsRdrFnTable copy{};
+    SaHpiUint32T mapl = 0;
+    KviCsRwLockT *lock = nullptr;
+    ASSERT_EQ(kviCsRdrGetWatchdog(0, rid_, 1, &rdr, &active, &userOut, &copy, &mapl, &lock),
+              SA_OK);
+    EXPECT_EQ(rdr.RdrTypeUnion.WatchdogRec.WatchdogNum, 1);
+    EXPECT_FALSE(active) << "records carry their resource's state";
+    EXPECT_EQ(userOut, &user);
+    EXPECT_EQ(copy.WatchdogTimerReset, table.WatchdogTimerReset);
+    EXPECT_EQ(mapl, kTestMapl);
+    EXPECT_EQ(lock, testLock());
+    ASSERT_EQ(kviCsRptEntryActiveStateSetByRid(0, rid_, SAHPI_TRUE), SA_OK);
+    ASSERT_EQ(kviCsRdrGetWatchdog(0, rid_, 1, nullptr, &active, nullptr, nullptr, nullptr,
+                                  nullptr),
+              SA_OK);
+    EXPECT_TRUE(active);
+}
+
+TEST_F(RdrTest, UnknownResourcesDomainsAndNullArguments)
+{
+    SaHpiRdrT rdr = makeRdr(SAHPI_SENSOR_RDR);
+    KviDsRdrFnTable table{};
+    SaHpiEntryIdT recordId = 0;
+    KviCsRdrRecordNumT number{};
+    SaHpiBoolT active = SAHPI_FALSE;
+    SaHpiEirIdT eir = 0;
+    KviLogCapture log(KVI_LOG_DBG_L_NUM);
+    EXPECT_EQ(kviCsRdrAdd(0, 99, &rdr, nullptr, &table, &recordId, &number),
+              SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_TRUE(log.contains("kviCsRptGetRptEntryContainer failed, returned -1013"));
+    EXPECT_EQ(kviCsRdrAdd(2, rid_, &rdr, nullptr, &table, &recordId, &number),
+              SA_ERR_HPI_INVALID_DOMAIN);
+    EXPECT_TRUE(log.contains("Invalid Domain"));
+    EXPECT_EQ(get(SAHPI_NO_RECORD, 1, &rdr), SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_EQ(kviCsRdrGet(0, 99, SAHPI_NO_RECORD, 1, nullptr, &rdr, &active, nullptr, nullptr,
+                          nullptr, nullptr),
+              SA_ERR_HPI_INVALID_RESOURCE);
+    EXPECT_TRUE(log.contains("kviCsRptGetRptEntryContainer didn't return container, returned"));
+    EXPECT_EQ(kviCsDefaultEirSet(0, 99, 1), SA_ERR_HPI_INVALID_RESOURCE);
+    EXPECT_EQ(kviCsDefaultWatchdogGet(0, 99, &eir), SA_ERR_HPI_INVALID_RESOURCE);
+
+    EXPECT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, nullptr, &recordId, &number),
+              SA_ERR_HPI_INVALID_PARAMS);
+    EXPECT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, nullptr, &number),
+              SA_ERR_HPI_INVALID_PARAMS);
+    EXPECT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, &recordId, nullptr),
+              SA_ERR_HPI_INVALID_PARAMS);
+    EXPECT_EQ(kviCsRdrAdd(0, rid_, nullptr, nullptr, &table, &recordId, &number),
+              SA_ERR_HPI_INVALID_PARAMS);
+    EXPECT_EQ(kviCsRdrGet(0, rid_, SAHPI_NO_RECORD, 1, nullptr, &rdr, nullptr, nullptr, nullptr,
+                          nullptr, nullptr),
+              SA_ERR_HPI_INVALID_PARAMS);
+    EXPECT_EQ(kviCsDefaultEirGet(0, rid_, nullptr), SA_ERR_HPI_INVALID_PARAMS);
+    for (const char *line :
+         {"FnTable pointer is NULL.", "RecordId pointer is NULL.", "RecordNum pointer is NULL.",
+          "RdrEntry pointer is NULL.", "Active pointer is NULL.", "EirId pointer is NULL."})
+        EXPECT_TRUE(log.contains(line)) << line;
+    EXPECT_EQ(nextRecordId(rid_), 1u) << "refused calls spend no id";
+}
+
+TEST_F(RdrTest, NumberZeroOfInventoryAndWatchdogNamesTheDefault)
+{
+    for (SaHpiRdrTypeT type : {SAHPI_CTRL_RDR, SAHPI_INVENTORY_RDR, SAHPI_WATCHDOG_RDR,
+                               SAHPI_INVENTORY_RDR, SAHPI_WATCHDOG_RDR})
+        addRdr(rid_, type);
+    SaHpiEirIdT eir = 9;
+    SaHpiWatchdogNumT watchdog = 9;
+    ASSERT_EQ(kviCsDefaultEirGet(0, rid_, &eir), SA_OK);
+    ASSERT_EQ(kviCsDefaultWatchdogGet(0, rid_, &watchdog), SA_OK);
+    EXPECT_EQ(eir, 0);
+    EXPECT_EQ(watchdog, 0);
+
+    ASSERT_EQ(kviCsDefaultEirSet(0, rid_, 4), SA_OK);
+    ASSERT_EQ(kviCsDefaultWatchdogSet(0, rid_, 5), SA_OK);
+    // Wrong kind or no such record: the default stays as it was.
+    EXPECT_EQ(kviCsDefaultEirSet(0, rid_, 3), SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_EQ(kviCsDefaultWatchdogSet(0, rid_, 2), SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_EQ(kviCsDefaultEirSet(0, rid_, 9), SA_ERR_HPI_NOT_PRESENT);
+
+    SaHpiRdrT rdr{};
+    SaHpiBoolT active = SAHPI_FALSE;
+    ASSERT_EQ(kviCsRdrGetEir(0, rid_, SAHPI_DEFAULT_INVENTORY_ID, &rdr, &active, nullptr, nullptr,
+                             nullptr, nullptr),
+              SA_OK);
+    EXPECT_EQ(rdr.RecordId, 4u);
+    ASSERT_EQ(kviCsRdrGetWatchdog(0, rid_, SAHPI_DEFAULT_WATCHDOG_NUM, &rdr, &active, nullptr,
+                                  nullptr, nullptr, nullptr),
+              SA_OK);
+    EXPECT_EQ(rdr.RecordId, 5u);
+    ASSERT_EQ(kviCsRdrGetEir(0, rid_, 2, &rdr, &active, nullptr, nullptr, nullptr, nullptr),
+              SA_OK);
+    EXPECT_EQ(rdr.RecordId, 2u);
+}
+
+TEST_F(RdrTest, HashSizeAppliesToRepositoriesMadeAfterIt)
+{
+    SaHpiUint32T size = 0;
+    KviLogCapture log(KVI_LOG_DBG_L_NUM);
+    EXPECT_EQ(kviCsRdrHashSizeSet(0), SA_ERR_HPI_INVALID_PARAMS);
+    EXPECT_TRUE(log.contains("Hash size can't be set to 0!"));
+    EXPECT_EQ(kviCsRdrHashSizeGet(nullptr), SA_ERR_HPI_INVALID_PARAMS);
+    EXPECT_TRUE(log.contains("HashSize pointer is NULL."));
+
+    ASSERT_EQ(kviCsRdrHashSizeSet(7), SA_OK);
+    ASSERT_EQ(kviCsRdrHashSizeGet(&size), SA_OK);
+    EXPECT_EQ(size, 7u);
+    SaHpiResourceIdT old = rid_;
+    rid_ = addResource(SAHPI_FALSE);
+    ASSERT_EQ(kviCsRdrHashSizeSet(KVI_CS_DEFAULT_RDR_HASH_SIZE), SA_OK);
+    withRepository(old, [](KviCsRdrRepositoryContainerT *repo) { EXPECT_EQ(repo->HashSize, 3u); });
+    withRepository(rid_, [](KviCsRdrRepositoryContainerT *repo) { EXPECT_EQ(repo->HashSize, 7u); });
+    for (int i = 0; i < 8; i++)
+        addRdr(rid_, SAHPI_SENSOR_RDR);
+    EXPECT_EQ(walk(), (Ids{7, 1, 8, 2, 3, 4, 5, 6}));
+}
+
+// Cleanup calls per user pointer.
+std::map<void *, int> cleanups;
+
+SaErrorT countCleanup(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRdrT *Rdr, void *UserData,
+                      KviDsRdrFnTable *FnTable)
+{
+    EXPECT_EQ(FnTable->RdrResourcesRemove, &countCleanup);
+    EXPECT_EQ(*static_cast<SaHpiEntryIdT *>(UserData), Rdr->RecordId);
+    cleanups[UserData]++;
+    return SA_OK;
+}
+
+TEST_F(RdrTest, RemovingAResourceCallsEachRecordsCleanupOnce)
+{
+    cleanups.clear();
+    KviDsRdrFnTable counting{};
+    counting.RdrResourcesRemove = countCleanup;
+    SaHpiEntryIdT ids[7] = {1, 2, 3, 4, 5, 6, 7};
+    for (SaHpiEntryIdT &id : ids)
+        addRdr(rid_, SAHPI_SENSOR_RDR, id % 3 == 0 ? KviDsRdrFnTable{} : counting, &id);
+    ASSERT_EQ(kviCsRptEntryRemoveByRid(0, rid_), SA_OK);
+    EXPECT_EQ(cleanups.size(), 5u);
+    for (auto &[user, calls] : cleanups)
+        EXPECT_EQ(calls, 1) << *static_cast<SaHpiEntryIdT *>(user);
+}
+
+TEST_F(RdrTest, FailedAllocationsLeaveTheRepositoryAsItWasAndSpendTheId)
+{
+    addRdr(rid_, SAHPI_SENSOR_RDR);
+    // The record's list node, then its container.
+    const std::pair<SaHpiInt32T, const char *> cases[] = {
+        {1, "kviCsLinkedListNodeMalloc failed, Out of Space"}, {2, "Malloc failed"}};
+    for (auto [failing, line] : cases) {
+        SCOPED_TRACE(failing);
+        SaHpiInt32T blocks = liveBlocks();
+        KviLogCapture log(KVI_LOG_DBG_L_NUM);
+        SaHpiRdrT rdr = makeRdr(SAHPI_CTRL_RDR);
+        KviDsRdrFnTable table{};
+        SaHpiEntryIdT recordId = 0;
+        KviCsRdrRecordNumT number{};
+        kviCsMemoryFailNthAllocation(failing);
+        EXPECT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, &recordId, &number),
+                  SA_ERR_HPI_OUT_OF_SPACE);
+        kviCsMemoryFailNthAllocation(0);
+        EXPECT_TRUE(log.contains(line));
+        EXPECT_EQ(liveBlocks(), blocks);
+        EXPECT_EQ(walk(), (Ids{1}));
+    }
+    EXPECT_EQ(addRdr(rid_, SAHPI_SENSOR_RDR), 4u);
+}
+
+TEST_F(RdrTest, RecordIdsRollingOverEndsTheProcess)
+{
+    withRepository(rid_,
+                   [](KviCsRdrRepositoryContainerT *repo) { repo->NextRecordId = 0xFFFFFFFE; });
+    EXPECT_EQ(addRdr(rid_, SAHPI_SENSOR_RDR), 0xFFFFFFFEu);
+    expectFatalExit([this] { addRdr(rid_, SAHPI_SENSOR_RDR); },
+                    "Record Id's have rolled over (more than 2^32 generated). Record Id's are no "
+                    "longer unique.  This is bad. ");
+}
+
+} // namespace
