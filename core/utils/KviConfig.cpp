@@ -49,7 +49,10 @@ constexpr CharSet makeCharSet(const char *chars)
 constexpr CharSet keyCharacters = makeCharSet(KV_VALID_CHARACTERS);
 constexpr CharSet keyReadCharacters = makeCharSet(KV_KEY_READ_CHARACTERS);
 
-bool isKeyCharacter(char c) { return keyCharacters.member[static_cast<unsigned char>(c)]; }
+bool isKeyCharacter(char c)
+{
+    return keyCharacters.member[static_cast<unsigned char>(c)];
+}
 
 KviCsCfgContainer *resolve(KviCsCfgContainer *container)
 {
@@ -80,8 +83,8 @@ bool isShuttingDown(KviCsCfgContainer *container)
 
 void setShuttingDown(KviCsCfgContainer *container)
 {
-    std::atomic_ref<SaHpiBoolT>(container->ShuttingDown).store(SAHPI_TRUE,
-                                                              std::memory_order_release);
+    std::atomic_ref<SaHpiBoolT>(container->ShuttingDown)
+        .store(SAHPI_TRUE, std::memory_order_release);
 }
 
 // Skips the rest of a line whose start was looked at already: advances to the
@@ -181,7 +184,10 @@ SaErrorT startWatcher(KviCsCfgContainer *container, const char *mallocMessage)
 
 } // namespace
 
-void kviCsConfigSetReadHook(KviCsCfgReadHookT Hook) noexcept { readHook.store(Hook); }
+void kviCsConfigSetReadHook(KviCsCfgReadHookT Hook) noexcept
+{
+    readHook.store(Hook);
+}
 
 // ---------------------------------------------------------------------------
 // Reading and parsing the file
@@ -276,8 +282,7 @@ SaErrorT kviCsConfigLoadValues(KviCsCfgContainer *ConfigContainer) noexcept
                 KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Unable to close file stream");
             // A malformed file still loads whatever lines were good; the
             // parser has logged the rest.
-            kviCsCfgDataParseData(buffer, static_cast<SaHpiUint32T>(sizeBefore),
-                                  ConfigContainer);
+            kviCsCfgDataParseData(buffer, static_cast<SaHpiUint32T>(sizeBefore), ConfigContainer);
             KVI_CS_FREE(buffer);
             return SA_OK;
         }
@@ -361,8 +366,7 @@ SaErrorT kviCsCfgDataParseKeyValuePair(const char *CfgFileText, SaHpiUint32T Siz
         }
         unsigned char c = static_cast<unsigned char>(CfgFileText[i]);
         if (!keyReadCharacters.member[c]) {
-            KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid characher ascii(%d) found. (line %d)", c,
-                     line);
+            KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid characher ascii(%d) found. (line %d)", c, line);
             return fail(SA_ERR_HPI_INVALID_DATA);
         }
         ++i;
@@ -716,8 +720,8 @@ SaErrorT kviCsConfigInitStructure(KviCsCfgContainer *ConfigContainer,
     }
     memcpy(cfgContainer->Filename, FileName, nameSize);
 
-    cfgContainer->CallbackList = static_cast<KviCsCfgCallbackList *>(KVI_CS_MALLOC(
-        sizeof(KviCsCfgCallbackList) + INITIAL_CALLBACKS * sizeof(KviCsCfgCallback)));
+    cfgContainer->CallbackList = static_cast<KviCsCfgCallbackList *>(
+        KVI_CS_MALLOC(sizeof(KviCsCfgCallbackList) + INITIAL_CALLBACKS * sizeof(KviCsCfgCallback)));
     if (cfgContainer->CallbackList == nullptr) {
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Malloc failed");
         return fail(2, SA_ERR_HPI_OUT_OF_SPACE);
@@ -779,8 +783,7 @@ SaErrorT kviCsConfigFinalizeStrucure(KviCsCfgContainer *CfgContainer) noexcept
     }
 
     if (KVI_CS_SEM_TRYWAIT(&cfgContainer->GeneralSem) != SA_OK) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL,
-                 "GeneralSem is locked.  No other thread should be using it");
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "GeneralSem is locked.  No other thread should be using it");
         KVI_CS_DOA_SEM_POST(&(cfgContainer->DeleteSem));
         trace.exitMessage("Error");
         return SA_ERR_HPI_INVALID_REQUEST;
@@ -843,8 +846,8 @@ SaErrorT kviCsConfigFinalize(void) noexcept
     KVI_TRACE("Default container %p", static_cast<void *>(&defaultConfigContainer));
     SaErrorT rc = kviCsConfigFinalizeStrucure(&defaultConfigContainer);
     if (rc != SA_OK)
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "kviCsConfigFinalizeStrucure for default container failed %d",
-                 rc);
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL,
+                 "kviCsConfigFinalizeStrucure for default container failed %d", rc);
     return SA_OK;
 }
 
@@ -981,8 +984,7 @@ SaErrorT kviCsConfigPerformCallbacks(KviCsCfgContainer *CfgContainer) noexcept
                 trace.exitMessage("Error");
                 return SA_ERR_HPI_OUT_OF_SPACE;
             }
-            memcpy(callbacks, cfgContainer->CallbackList->Entry,
-                   count * sizeof(KviCsCfgCallback));
+            memcpy(callbacks, cfgContainer->CallbackList->Entry, count * sizeof(KviCsCfgCallback));
         }
     }
     for (SaHpiUint32T i = 0; i < count; ++i)

@@ -23,8 +23,8 @@ std::string generation(char tag)
 {
     std::string text;
     for (int i = 0; i < 200; ++i)
-        text += "key" + std::to_string(1000 + i) + " = \"" + tag + std::to_string(1000 + i) +
-                "\"\n";
+        text +=
+            "key" + std::to_string(1000 + i) + " = \"" + tag + std::to_string(1000 + i) + "\"\n";
     return text;
 }
 
@@ -80,7 +80,10 @@ void rewrite(const KviTempDir &dir, char tag, long shift)
 }
 
 std::atomic<int> reloads{0};
-void countReload() { reloads++; }
+void countReload()
+{
+    reloads++;
+}
 
 TEST(KviConfigConcurrency, ReadersSeeWholeListsWhileReloadsSwapThem)
 {

@@ -110,11 +110,17 @@ TEST(KviConfigParser, RefusedLinesAreSkippedAndReported)
         {"key=\"value\"\nok = \"1\"",
          "Unexpected token asc(34) '\"' found when expecting equal sign, line 1",
          {{"ok", "1"}}},
-        {"key ==\"v\"\nok = \"1\"", "Value doesn't start with double quotes! line=1", {{"ok", "1"}}},
-        {"key = value\nok = \"1\"", "Value doesn't start with double quotes! line=1", {{"ok", "1"}}},
-        {"\"q\" = \"1\"\nok = \"1\"", "Invalid character asc(34) found in config file at position 0!",
+        {"key ==\"v\"\nok = \"1\"",
+         "Value doesn't start with double quotes! line=1",
          {{"ok", "1"}}},
-        {"ok = \"1\"\n!x = \"1\"", "Invalid character asc(33) found in config file at position 9!",
+        {"key = value\nok = \"1\"",
+         "Value doesn't start with double quotes! line=1",
+         {{"ok", "1"}}},
+        {"\"q\" = \"1\"\nok = \"1\"",
+         "Invalid character asc(34) found in config file at position 0!",
+         {{"ok", "1"}}},
+        {"ok = \"1\"\n!x = \"1\"",
+         "Invalid character asc(33) found in config file at position 9!",
          {{"ok", "1"}}},
         {"ke!y = \"1\"\nok = \"1\"", "Invalid characher ascii(33) found. (line 1)", {{"ok", "1"}}},
         // A carriage return inside a key is not a key character.
@@ -398,8 +404,8 @@ TEST(KviConfigReader, FilesThatCannotBeRead)
     SaHpiInt32T base = kviTestLiveBlocks();
     FileShell missing(dir.file("missing"));
     EXPECT_EQ(kviCsConfigLoadValues(missing.container()), SA_ERR_HPI_ERROR);
-    EXPECT_TRUE(log.contains("Can't open " + dir.file("missing") +
-                             ".  error = No such file or directory"));
+    EXPECT_TRUE(
+        log.contains("Can't open " + dir.file("missing") + ".  error = No such file or directory"));
 
     FileShell directory(dir.path());
     EXPECT_EQ(kviCsConfigLoadValues(directory.container()), SA_ERR_HPI_ERROR);

@@ -382,8 +382,7 @@ TEST(KviConfigContainer, DefaultContainerLifecycle)
     EXPECT_EQ(kviCsConfigInit(SAHPI_FALSE, dir.file("missing").c_str()), SA_ERR_HPI_ERROR);
     EXPECT_TRUE(log.contains("kviCsConfigInitStructure failed -1001"));
     SaHpiUint32T count = 0;
-    EXPECT_EQ(kviCsCfgDataUint32Get("max_mapl_count", &count, nullptr),
-              SA_ERR_HPI_INVALID_PARAMS);
+    EXPECT_EQ(kviCsCfgDataUint32Get("max_mapl_count", &count, nullptr), SA_ERR_HPI_INVALID_PARAMS);
 
     ASSERT_EQ(kviCsConfigInit(SAHPI_TRUE, path.c_str()), SA_OK);
     EXPECT_EQ(kviCsCfgDataUint32Get("max_mapl_count", &count, nullptr), SA_OK);
@@ -394,8 +393,7 @@ TEST(KviConfigContainer, DefaultContainerLifecycle)
 
     EXPECT_EQ(kviCsConfigFinalize(), SA_OK);
     EXPECT_EQ(kviTestLiveBlocks(), base);
-    EXPECT_EQ(kviCsCfgDataUint32Get("max_mapl_count", &count, nullptr),
-              SA_ERR_HPI_INVALID_PARAMS);
+    EXPECT_EQ(kviCsCfgDataUint32Get("max_mapl_count", &count, nullptr), SA_ERR_HPI_INVALID_PARAMS);
     // Finalizing what is not there is only logged.
     EXPECT_EQ(kviCsConfigFinalize(), SA_OK);
     EXPECT_TRUE(log.contains("kviCsConfigFinalizeStrucure for default container failed -1011"));
@@ -414,8 +412,12 @@ TEST(KviConfigContainer, DefaultContainerLifecycle)
 // Callbacks ------------------------------------------------------------------
 
 std::vector<int> calls;
-template <int N> void record() { calls.push_back(N); }
-template <int... N> std::array<KviCsCfgCallback, sizeof...(N)> recorders(std::integer_sequence<int, N...>)
+template <int N> void record()
+{
+    calls.push_back(N);
+}
+template <int... N>
+std::array<KviCsCfgCallback, sizeof...(N)> recorders(std::integer_sequence<int, N...>)
 {
     return {record<N>...};
 }
@@ -547,7 +549,10 @@ TEST_F(KviConfigCallbacks, AReloadThatFailsKeepsTheOldSettings)
 // The watcher ----------------------------------------------------------------
 
 std::atomic<int> watcherCalls{0};
-void countingCallback() { watcherCalls++; }
+void countingCallback()
+{
+    watcherCalls++;
+}
 
 TEST_F(KviConfigCallbacks, WatcherReloadsATouchedFileAndKeepsReloadingEverySecond)
 {
@@ -588,8 +593,8 @@ TEST_F(KviConfigCallbacks, AWatcherCanBeAddedOnceAndEndsWhenItsFileGoes)
     EXPECT_EQ(kviCsConfigAddWaitingThread(&cont_), SA_ERR_HPI_DUPLICATE);
     EXPECT_TRUE(log.contains("kviCsConfigAddWaitingThread called on config container with thread"));
     ASSERT_EQ(remove(path_.c_str()), 0);
-    EXPECT_TRUE(waitFor([&] { return log.contains("Unable to load config file " + path_); },
-                        3000ms));
+    EXPECT_TRUE(
+        waitFor([&] { return log.contains("Unable to load config file " + path_); }, 3000ms));
     // The thread has ended; finalization joins it all the same.
 }
 
@@ -608,7 +613,10 @@ TEST_F(KviConfigCallbacks, AddingAWatcherCanFail)
     EXPECT_TRUE(log.contains("CfgContainer is NULL"));
 }
 
-void wedgeDeleteSem() { reading->DeleteSem.Value = KVI_MAX_INT32; }
+void wedgeDeleteSem()
+{
+    reading->DeleteSem.Value = KVI_MAX_INT32;
+}
 
 TEST_F(KviConfigCallbacks, AFailedReleaseEndsTheProcess)
 {
