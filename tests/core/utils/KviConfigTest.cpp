@@ -51,6 +51,20 @@ bool waitFor(const std::function<bool()> &done, std::chrono::milliseconds limit)
     return true;
 }
 
+// Finalization refuses a container whose callbacks are running at that very
+// moment (a watcher that reloads every second), and the caller tries again.
+SaErrorT finalizeWhenIdle(KviCsCfgContainer *container)
+{
+    SaErrorT rc = SA_OK;
+    for (int attempt = 0; attempt < 50; ++attempt) {
+        rc = kviCsConfigFinalizeStrucure(container);
+        if (rc != SA_ERR_HPI_INVALID_REQUEST)
+            break;
+        std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    }
+    return rc;
+}
+
 // A container loaded from a file of its own.
 class ContainerTest : public testing::Test
 {
@@ -64,7 +78,7 @@ class ContainerTest : public testing::Test
     void TearDown() override
     {
         if (loaded_) {
-            EXPECT_EQ(kviCsConfigFinalizeStrucure(&cont_), SA_OK);
+            EXPECT_EQ(finalizeWhenIdle(&cont_), SA_OK);
         }
     }
     std::string get(const char *key)
