@@ -3,6 +3,7 @@
 #pragma once
 
 #include <dlfcn.h>
+#include <unistd.h>
 
 #include <cstdlib>
 #include <string>
@@ -88,4 +89,42 @@ inline bool kviTestLoggedAt(const KviLogCapture &Log, SaHpiUint32T Level, std::s
         if (line.find(tag) != std::string::npos)
             return true;
     return false;
+}
+
+// Polls Done every few milliseconds for up to TimeoutMs.
+template <typename Pred> bool kviTestWaitFor(Pred Done, int TimeoutMs = 5000)
+{
+    for (int waited = 0; waited < TimeoutMs; waited += 5) {
+        if (Done())
+            return true;
+        usleep(5000);
+    }
+    return Done();
+}
+
+// Calls the resource's ResourcePowerStateGet slot the way a redirected call
+// reaches a plug-in: the master lock for reading, the plug-in lock stored with
+// the resource for reading, the master lock released, then the call.
+inline SaErrorT kviTestCallIntoPlugin(SaHpiResourceIdT ResourceId)
+{
+    KviCsRwLockT *master = nullptr;
+    if (kviDsMaplManagerGetMaplMasterLock(&master) != SA_OK)
+        return SA_ERR_HPI_ERROR;
+    if (KVI_CS_RW_LOCK_RD_LOCK(master, 1000) != SA_OK)
+        return SA_ERR_HPI_NO_RESPONSE;
+    KviDsRptFnTable table{};
+    void *user = nullptr;
+    SaHpiUint32T mapl = 0;
+    KviCsRwLockT *lock = nullptr;
+    SaErrorT rc = kviCsRptActiveEntryGetByRid(SAHPI_DEFAULT_DOMAIN_ID, ResourceId, nullptr, &table,
+                                              &user, &mapl, &lock);
+    if (rc == SA_OK)
+        rc = KVI_CS_RW_LOCK_RD_LOCK(lock, 1000);
+    KVI_CS_RW_LOCK_RD_UNLOCK(master);
+    if (rc != SA_OK)
+        return rc;
+    SaHpiHsPowerStateT state = SAHPI_HS_POWER_OFF;
+    rc = table.ResourcePowerStateGet(SAHPI_DEFAULT_DOMAIN_ID, ResourceId, user, &state);
+    KVI_CS_RW_LOCK_RD_UNLOCK(lock);
+    return rc;
 }
