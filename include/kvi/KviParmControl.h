@@ -48,8 +48,7 @@ KVI_API SaErrorT kviCsParmControl(SaHpiDomainIdT DomainId, SaHpiResourceIdT Reso
 /* Saves the event-log state (when the table can read it), the resource tag
  * and the severity under flag 0. */
 KVI_API SaErrorT kviCsRptSaveParmControl(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                         KviDsRptFnTable *FnTable,
-                                         void *UserDefined) KVI_NOEXCEPT;
+                                         KviDsRptFnTable *FnTable, void *UserDefined) KVI_NOEXCEPT;
 
 /* Puts back the tag and the event-log state of the copy DaemonRestore names
  * and the severity of the flag-0 copy. A daemon restore passes over what was
@@ -67,9 +66,8 @@ KVI_API SaErrorT kviCsRdrPerformParmAction(SaHpiDomainIdT DomainId, SaHpiResourc
 
 /* Saves the thresholds of a threshold sensor and the event enables of a
  * sensor with events, under flag 0. */
-KVI_API SaErrorT kviCsRdrSaveSensorParmControl(SaHpiDomainIdT DomainId,
-                                               SaHpiResourceIdT ResourceId, SaHpiRdrT *Rdr,
-                                               KviDsRdrFnTable *FnTable,
+KVI_API SaErrorT kviCsRdrSaveSensorParmControl(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
+                                               SaHpiRdrT *Rdr, KviDsRdrFnTable *FnTable,
                                                void *UserData) KVI_NOEXCEPT;
 
 /* Puts back the thresholds (of the copy IsDaemonRestore names; only those
@@ -187,10 +185,9 @@ KVI_API SaErrorT kviCsDeamonRestoreEventEnables(SaHpiDomainIdT DomainId,
                                                 SaHpiSensorNumT SensorNum, SaHpiRdrT *Rdr,
                                                 KviDsRdrFnTable *FnTable,
                                                 void *UserData) KVI_NOEXCEPT;
-KVI_API SaErrorT kviCsDeamonRestoreCtrlState(SaHpiDomainIdT DomainId,
-                                             SaHpiResourceIdT ResourceId, SaHpiCtrlNumT CtrlNum,
-                                             SaHpiRdrT *Rdr, KviDsRdrFnTable *FnTable,
-                                             void *UserData) KVI_NOEXCEPT;
+KVI_API SaErrorT kviCsDeamonRestoreCtrlState(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
+                                             SaHpiCtrlNumT CtrlNum, SaHpiRdrT *Rdr,
+                                             KviDsRdrFnTable *FnTable, void *UserData) KVI_NOEXCEPT;
 
 KVI_EXTERN_C_END
 

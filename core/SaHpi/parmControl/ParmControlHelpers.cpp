@@ -174,8 +174,8 @@ KVI_EXPORT SaErrorT kviCsSaveResSeverityNV(SaHpiDomainIdT DomainId, SaHpiResourc
     KVI_TRACE("");
     KVI_NULL_CHECK(Severity);
     char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RPT(key, KVI_NVKEY_RESOURCE_SEVERITY_PREFIX, IsDaemonSave,
-                                   DomainId, ResourceId);
+    KVI_CREATE_NV_PARMCTRL_KEY_RPT(key, KVI_NVKEY_RESOURCE_SEVERITY_PREFIX, IsDaemonSave, DomainId,
+                                   ResourceId);
     KVI_DLOG(KVI_LOG_DBG_L, "Storing resource severity in Non-Vol. memory");
     return putItem(key, sizeof *Severity, Severity);
 }
@@ -187,8 +187,8 @@ KVI_EXPORT SaErrorT kviCsGetResSeverityNV(SaHpiDomainIdT DomainId, SaHpiResource
     KVI_TRACE("");
     KVI_NULL_CHECK(Severity);
     char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RPT(key, KVI_NVKEY_RESOURCE_SEVERITY_PREFIX, IsDaemonSave,
-                                   DomainId, ResourceId);
+    KVI_CREATE_NV_PARMCTRL_KEY_RPT(key, KVI_NVKEY_RESOURCE_SEVERITY_PREFIX, IsDaemonSave, DomainId,
+                                   ResourceId);
     return getWhole(key, IsDaemonSave, sizeof *Severity, Severity);
 }
 
@@ -287,8 +287,8 @@ KVI_EXPORT SaErrorT kviCsGetCtrlStateNV(SaHpiDomainIdT DomainId, SaHpiResourceId
 // Inventory data
 
 KVI_EXPORT SaErrorT kviCsSaveFruNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                   SaHpiEirIdT EirId, SaHpiBoolT IsDaemonSave,
-                                   SaHpiUint32T FruSize, const void *FruBuffer) noexcept
+                                   SaHpiEirIdT EirId, SaHpiBoolT IsDaemonSave, SaHpiUint32T FruSize,
+                                   const void *FruBuffer) noexcept
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(FruBuffer);
@@ -323,8 +323,8 @@ KVI_EXPORT SaErrorT kviCsGetFruSizeNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT 
 }
 
 KVI_EXPORT SaErrorT kviCsGetFruNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                  SaHpiEirIdT EirId, SaHpiBoolT IsDaemonSave,
-                                  SaHpiUint32T FruSize, void *FruBuffer) noexcept
+                                  SaHpiEirIdT EirId, SaHpiBoolT IsDaemonSave, SaHpiUint32T FruSize,
+                                  void *FruBuffer) noexcept
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(FruBuffer);
@@ -374,9 +374,9 @@ SaErrorT kviCsRdrWalk(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
     do {
         KviRdrVisitT record{};
         SaHpiEntryIdT next = SAHPI_LAST_ENTRY;
-        SaErrorT rc = kviCsRdrGet(DomainId, ResourceId, SAHPI_NO_RECORD, entry, &next,
-                                  &record.Rdr, &record.Active, &record.UserData, &record.FnTable,
-                                  nullptr, nullptr);
+        SaErrorT rc =
+            kviCsRdrGet(DomainId, ResourceId, SAHPI_NO_RECORD, entry, &next, &record.Rdr,
+                        &record.Active, &record.UserData, &record.FnTable, nullptr, nullptr);
         if (rc == SA_ERR_HPI_NOT_PRESENT && entry == SAHPI_FIRST_ENTRY) {
             KVI_DLOG(KVI_LOG_DBG_L, "No RDRs exist. Returning OK");
             return SA_OK;

@@ -12,19 +12,19 @@
 // Keys of resource-level and record-level settings: prefix, flag digit,
 // domain id, resource id and, for a record, its 8-bit number, in lower-case
 // hex. The longest ("kviSavFru " form) is 29 characters, the store's limit.
-#define KVI_CREATE_NV_PARMCTRL_KEY_RPT(Key, Prefix, Flag, DomainId, ResourceId)                 \
-    do {                                                                                          \
-        snprintf((Key), KVI_MAX_NV_KEY_LENGTH, "%s%d%8.8x%8.8x", (Prefix), (Flag) ? 1 : 0,       \
-                 static_cast<unsigned>(DomainId), static_cast<unsigned>(ResourceId));             \
-        KVI_DLOG(KVI_LOG_DBG_L, "%s key: %s", (Prefix), (Key));                                   \
+#define KVI_CREATE_NV_PARMCTRL_KEY_RPT(Key, Prefix, Flag, DomainId, ResourceId)                    \
+    do {                                                                                           \
+        snprintf((Key), KVI_MAX_NV_KEY_LENGTH, "%s%d%8.8x%8.8x", (Prefix), (Flag) ? 1 : 0,         \
+                 static_cast<unsigned>(DomainId), static_cast<unsigned>(ResourceId));              \
+        KVI_DLOG(KVI_LOG_DBG_L, "%s key: %s", (Prefix), (Key));                                    \
     } while (0)
 
-#define KVI_CREATE_NV_PARMCTRL_KEY_RDR(Key, Prefix, Flag, DomainId, ResourceId, Num)             \
-    do {                                                                                          \
-        snprintf((Key), KVI_MAX_NV_KEY_LENGTH, "%s%d%8.8x%8.8x%2.2x", (Prefix), (Flag) ? 1 : 0,  \
-                 static_cast<unsigned>(DomainId), static_cast<unsigned>(ResourceId),              \
-                 static_cast<unsigned>(static_cast<SaHpiUint8T>(Num)));                           \
-        KVI_DLOG(KVI_LOG_DBG_L, "%s key: %s", (Prefix), (Key));                                   \
+#define KVI_CREATE_NV_PARMCTRL_KEY_RDR(Key, Prefix, Flag, DomainId, ResourceId, Num)               \
+    do {                                                                                           \
+        snprintf((Key), KVI_MAX_NV_KEY_LENGTH, "%s%d%8.8x%8.8x%2.2x", (Prefix), (Flag) ? 1 : 0,    \
+                 static_cast<unsigned>(DomainId), static_cast<unsigned>(ResourceId),               \
+                 static_cast<unsigned>(static_cast<SaHpiUint8T>(Num)));                            \
+        KVI_DLOG(KVI_LOG_DBG_L, "%s key: %s", (Prefix), (Key));                                    \
     } while (0)
 
 // Reads the resource tag saved under Key. A read shorter than a whole text
@@ -37,10 +37,10 @@ SaErrorT kviCsReadResTagNV(const char *Key, bool LogMissing, SaHpiUint32T Mismat
 
 // How a restore answers the read of one saved item.
 struct KviRestoreTextsT {
-    const char *Missing;   // nothing saved, on an explicit restore
-    SaErrorT MissingRc;    // ... and its result
-    const char *Failed;    // any other failure of the read (may carry one %d: the code)
-    bool FailedKeepsCode;  // return the read's own code rather than SA_ERR_HPI_ERROR
+    const char *Missing;  // nothing saved, on an explicit restore
+    SaErrorT MissingRc;   // ... and its result
+    const char *Failed;   // any other failure of the read (may carry one %d: the code)
+    bool FailedKeepsCode; // return the read's own code rather than SA_ERR_HPI_ERROR
 };
 
 // The result of a restore after reading one item with ReadRc. SA_OK with
@@ -87,6 +87,6 @@ SaErrorT kviCsApplySensorEventEnables(SaHpiDomainIdT DomainId, SaHpiResourceIdT 
 // Writes a control state through ControlStateSet. An empty slot returns
 // NullSlotRc (the defaults and the restore answer it differently); a failing
 // set SA_ERR_HPI_ERROR.
-SaErrorT kviCsApplyCtrlState(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                             SaHpiRdrT *Rdr, KviDsRdrFnTable *FnTable, void *UserData,
-                             SaHpiCtrlStateT *State, SaErrorT NullSlotRc) noexcept;
+SaErrorT kviCsApplyCtrlState(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId, SaHpiRdrT *Rdr,
+                             KviDsRdrFnTable *FnTable, void *UserData, SaHpiCtrlStateT *State,
+                             SaErrorT NullSlotRc) noexcept;

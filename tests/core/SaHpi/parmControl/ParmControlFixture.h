@@ -243,6 +243,21 @@ inline bool loggedAt(const KviLogCapture &Log, SaHpiUint32T Level, const std::st
     return false;
 }
 
+// The key of a record's setting in domain 0.
+inline std::string rdrKey(const char *Prefix, int Flag, SaHpiResourceIdT Rid, unsigned Num)
+{
+    char key[KVI_MAX_NV_KEY_LENGTH];
+    snprintf(key, sizeof key, "%s%d%8.8x%8.8x%2.2x", Prefix, Flag, 0u, Rid, Num);
+    return key;
+}
+
+inline std::string rptKey(const char *Prefix, int Flag, SaHpiResourceIdT Rid)
+{
+    char key[KVI_MAX_NV_KEY_LENGTH];
+    snprintf(key, sizeof key, "%s%d%8.8x%8.8x", Prefix, Flag, 0u, Rid);
+    return key;
+}
+
 // The stored length of the object under Key (0 when there is none).
 inline SaHpiUint32T storedLength(const std::string &Key)
 {

@@ -148,8 +148,8 @@ TEST_F(ParmControlHelpersTest, ShortObjectsThatDisagreeWithTheirLengthFieldAreRe
     SaHpiTextBufferT tag = text("abcdef"), out{};
     ASSERT_EQ(kviCsNonVolatilePut("kviResTag00000000000000005", 12, &tag), SA_OK);
     EXPECT_EQ(kviCsGetResTagNV(0, 5, SAHPI_FALSE, &out), SA_ERR_HPI_DATA_TRUNCATED);
-    EXPECT_TRUE(loggedAt(log, KVI_LOG_ERR_NONFATAL_NUM,
-                         "bytesRead did not match TextBuffer size. 12, 15"));
+    EXPECT_TRUE(
+        loggedAt(log, KVI_LOG_ERR_NONFATAL_NUM, "bytesRead did not match TextBuffer size. 12, 15"));
 
     // A control state cut short that is not a text state, and a text state
     // whose length field disagrees with what was stored.
