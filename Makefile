@@ -25,7 +25,9 @@ bench: build
 fuzz: deps
 	cmake --preset fuzz
 	cmake --build --preset fuzz
-	@for f in build/fuzz/fuzz/*Fuzz; do echo "== $$f"; $$f -max_total_time=60 fuzz/corpus/$$(basename $$f) || exit 1; done
+	@for f in build/fuzz/fuzz/*Fuzz; do \
+	    n=$$(basename $$f); mkdir -p build/fuzz/work/$$n; echo "== $$n"; \
+	    $$f -max_total_time=60 build/fuzz/work/$$n fuzz/corpus/$$n || exit 1; done
 
 clean:
 	rm -rf build

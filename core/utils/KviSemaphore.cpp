@@ -26,7 +26,11 @@ struct SemLog {
     void operator()(const char *file, int line, const char *func, SaHpiUint32T level,
                     const char *format, Args... args) const
     {
-        if (on)
+        if (!on)
+            return;
+        if constexpr (sizeof...(Args) == 0)
+            kviCsLogger(file, static_cast<SaHpiInt16T>(line), func, level, "%s", format);
+        else
             kviCsLogger(file, static_cast<SaHpiInt16T>(line), func, level, format, args...);
     }
 };

@@ -12,7 +12,9 @@
 
 // Only the numeric address of a released block is logged; gcc cannot tell
 // that from a use of the block.
+#if defined(__GNUC__) && !defined(__clang__)
 #pragma GCC diagnostic ignored "-Wuse-after-free"
+#endif
 
 namespace
 {
