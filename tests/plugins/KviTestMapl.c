@@ -57,7 +57,9 @@
 #define SLOW_CALL_LIMIT_MS 5000
 
 static SaHpiUint32T maplNum = 0xFFFFFFFFu;
-static SaHpiResourceIdT resourceId;
+/* Discovery may run on several client threads at once. */
+static atomic_uint resourceId;
+static atomic_int discoveryClaimed;
 static atomic_int slowCallsRunning;
 static atomic_int slowCallsFinished;
 static atomic_int slowCallsReleased;
@@ -69,7 +71,7 @@ SaHpiUint32T kviTestMaplSlot(void)
 
 SaHpiResourceIdT kviTestMaplResource(void)
 {
-    return resourceId;
+    return atomic_load(&resourceId);
 }
 
 int kviTestMaplSlowCallsRunning(void)
@@ -155,9 +157,9 @@ static SaErrorT addResource(SaHpiDomainIdT DomainId)
         KVI_CS_FREE(userData);
         return rc;
     }
-    resourceId = added;
-    KVI_ILOG(KVI_LOG_INFO, "TestMapl %s discovered rid=%u in slot %u", KVI_TEST_MAPL_NAME,
-             resourceId, maplNum);
+    atomic_store(&resourceId, added);
+    KVI_ILOG(KVI_LOG_INFO, "TestMapl %s discovered rid=%u in slot %u", KVI_TEST_MAPL_NAME, added,
+             maplNum);
     return SA_OK;
 }
 
@@ -167,7 +169,12 @@ static SaErrorT resourcesDiscover(SaHpiDomainIdT DomainId)
         KVI_ILOG(KVI_LOG_INFO, "TestMapl %s fails discovery", KVI_TEST_MAPL_NAME);
         return SA_ERR_HPI_UNKNOWN;
     }
-    return resourceId == 0 ? addResource(DomainId) : SA_OK;
+    if (atomic_exchange(&discoveryClaimed, 1) != 0)
+        return SA_OK;
+    const SaErrorT rc = addResource(DomainId);
+    if (rc != SA_OK)
+        atomic_store(&discoveryClaimed, 0);
+    return rc;
 }
 
 #define MEMBER_(bit, fn) ((KVI_TEST_MAPL_NULL_MEMBERS & (bit)) ? NULL : (fn))
