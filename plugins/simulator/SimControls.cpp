@@ -5,7 +5,8 @@
 
 #include "SimModel.h"
 
-namespace {
+namespace
+{
 
 constexpr SaHpiTextTypeT TEXT_TYPE = SAHPI_TL_TYPE_LANGUAGE;
 constexpr SaHpiLanguageT TEXT_LANGUAGE = SAHPI_LANG_ENGLISH;
@@ -106,13 +107,13 @@ void assign(SimControlStateT *C, const SaHpiCtrlStateT *State) noexcept
 SaErrorT validate(const SimControlStateT *C, const SaHpiCtrlStateT *State) noexcept
 {
     const SimControlShapeT *s = C->Shape;
-    if (State->Type != s->Type) {
+    if (simRaw(State->Type) != s->Type) {
         return SA_ERR_HPI_INVALID_DATA;
     }
     const SaHpiCtrlStateUnionT &u = State->StateUnion;
     switch (s->Type) {
     case SAHPI_CTRL_TYPE_DIGITAL:
-        switch (u.Digital) {
+        switch (simRaw(u.Digital)) {
         case SAHPI_CTRL_STATE_OFF:
         case SAHPI_CTRL_STATE_ON:
         case SAHPI_CTRL_STATE_AUTO:
@@ -121,9 +122,8 @@ SaErrorT validate(const SimControlStateT *C, const SaHpiCtrlStateT *State) noexc
             return C->State.StateUnion.Digital == SAHPI_CTRL_STATE_ON ? SA_OK
                                                                       : SA_ERR_HPI_INVALID_REQUEST;
         case SAHPI_CTRL_STATE_PULSE_ON:
-            return C->State.StateUnion.Digital == SAHPI_CTRL_STATE_OFF
-                       ? SA_OK
-                       : SA_ERR_HPI_INVALID_REQUEST;
+            return C->State.StateUnion.Digital == SAHPI_CTRL_STATE_OFF ? SA_OK
+                                                                       : SA_ERR_HPI_INVALID_REQUEST;
         default:
             return SA_ERR_HPI_INVALID_PARAMS;
         }
@@ -138,7 +138,7 @@ SaErrorT validate(const SimControlStateT *C, const SaHpiCtrlStateT *State) noexc
                    : SA_OK;
     case SAHPI_CTRL_TYPE_TEXT: {
         const SaHpiTextBufferT &t = u.Text.Text;
-        if (t.DataType > SAHPI_TL_TYPE_LANGUAGE || t.Language > SAHPI_LANG_ZULU) {
+        if (simRaw(t.DataType) > SAHPI_TL_TYPE_LANGUAGE || simRaw(t.Language) > SAHPI_LANG_ZULU) {
             return SA_ERR_HPI_INVALID_PARAMS;
         }
         if (t.DataType != TEXT_TYPE || t.Language != TEXT_LANGUAGE ||
@@ -159,12 +159,24 @@ void defaultState(const SimRecordT *Record, SaHpiCtrlStateT *State) noexcept
     memset(State, 0, sizeof(*State));
     State->Type = rec.Type;
     switch (rec.Type) {
-    case SAHPI_CTRL_TYPE_DIGITAL: State->StateUnion.Digital = rec.TypeUnion.Digital.Default; break;
-    case SAHPI_CTRL_TYPE_DISCRETE: State->StateUnion.Discrete = rec.TypeUnion.Discrete.Default; break;
-    case SAHPI_CTRL_TYPE_ANALOG: State->StateUnion.Analog = rec.TypeUnion.Analog.Default; break;
-    case SAHPI_CTRL_TYPE_STREAM: State->StateUnion.Stream = rec.TypeUnion.Stream.Default; break;
-    case SAHPI_CTRL_TYPE_TEXT: State->StateUnion.Text = rec.TypeUnion.Text.Default; break;
-    case SAHPI_CTRL_TYPE_OEM: State->StateUnion.Oem = rec.TypeUnion.Oem.Default; break;
+    case SAHPI_CTRL_TYPE_DIGITAL:
+        State->StateUnion.Digital = rec.TypeUnion.Digital.Default;
+        break;
+    case SAHPI_CTRL_TYPE_DISCRETE:
+        State->StateUnion.Discrete = rec.TypeUnion.Discrete.Default;
+        break;
+    case SAHPI_CTRL_TYPE_ANALOG:
+        State->StateUnion.Analog = rec.TypeUnion.Analog.Default;
+        break;
+    case SAHPI_CTRL_TYPE_STREAM:
+        State->StateUnion.Stream = rec.TypeUnion.Stream.Default;
+        break;
+    case SAHPI_CTRL_TYPE_TEXT:
+        State->StateUnion.Text = rec.TypeUnion.Text.Default;
+        break;
+    case SAHPI_CTRL_TYPE_OEM:
+        State->StateUnion.Oem = rec.TypeUnion.Oem.Default;
+        break;
     }
 }
 
@@ -282,7 +294,7 @@ SaErrorT simControlStateGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiCtrlNumT, voi
         return SA_ERR_HPI_NOT_PRESENT;
     }
     // For a text control the caller names the line it wants to read.
-    SaHpiTxtLineNumT line = CtrlState->Type == SAHPI_CTRL_TYPE_TEXT
+    SaHpiTxtLineNumT line = simRaw(CtrlState->Type) == SAHPI_CTRL_TYPE_TEXT
                                 ? CtrlState->StateUnion.Text.Line
                                 : SAHPI_TLN_ALL_LINES;
     return stateOf(&record->Control, line, CtrlState);

@@ -6,7 +6,8 @@
 
 #include "SimModel.h"
 
-namespace {
+namespace
+{
 
 SimResourceT *resourceOf(void *UserDefined) noexcept
 {
@@ -33,7 +34,8 @@ SaHpiSelEntryIdT nextId(SimEventLogT &Log) noexcept
 SaErrorT append(SimEventLogT &Log, const SaHpiEventT *Event) noexcept
 {
     if (Log.Entries == nullptr) {
-        Log.Entries = static_cast<SaHpiSelEntryT *>(KVI_CS_MALLOC(Log.Size * sizeof(SaHpiSelEntryT)));
+        Log.Entries =
+            static_cast<SaHpiSelEntryT *>(KVI_CS_MALLOC(Log.Size * sizeof(SaHpiSelEntryT)));
         if (Log.Entries == nullptr) {
             return SA_ERR_HPI_OUT_OF_SPACE;
         }
@@ -80,9 +82,9 @@ SaErrorT find(const SimEventLogT &Log, SaHpiSelEntryIdT EntryId, SaHpiUint32T *I
 
 bool validEvent(const SaHpiEventT *Event) noexcept
 {
-    return Event->EventType >= SAHPI_ET_SENSOR && Event->EventType <= SAHPI_ET_USER &&
-           ((Event->Severity >= SAHPI_CRITICAL && Event->Severity <= SAHPI_OK) ||
-            Event->Severity == SAHPI_DEBUG);
+    SaHpiUint32T severity = simRaw(Event->Severity);
+    return simRaw(Event->EventType) <= SAHPI_ET_USER &&
+           (severity <= SAHPI_OK || severity == SAHPI_DEBUG);
 }
 
 // The records an entry refers to, looked up in the library's tables after

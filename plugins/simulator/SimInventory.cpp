@@ -16,7 +16,8 @@
 
 #include "SimModel.h"
 
-namespace {
+namespace
+{
 
 constexpr SaHpiUint32T MAX_RECORDS = 32;
 constexpr SaHpiUint32T MAX_CUSTOM = 16;
@@ -96,8 +97,7 @@ class BlobReader
 class Layout
 {
   public:
-    Layout(void *Base, SaHpiUint32T Size) noexcept
-        : base_(static_cast<char *>(Base)), size_(Size)
+    Layout(void *Base, SaHpiUint32T Size) noexcept : base_(static_cast<char *>(Base)), size_(Size)
     {
     }
     void *take(size_t Size, size_t Align = 8) noexcept
@@ -153,22 +153,18 @@ void putGeneral(BlobWriter &W, const GeneralTextsT &G, SaHpiUint32T Instance) no
     }
 }
 
-const GeneralTextsT ChassisTexts = {
-    {"Kvi Simulated Systems", "Simulated shelf", "1.0", "SIM-SHELF", "SIM-CH-%04u", "100-0001",
-     "shelf.fru", nullptr},
-    "Simulated hardware"};
-const GeneralTextsT BoardTexts = {
-    {"Kvi Simulated Systems", "Processor board", "2.1", "SIM-CPU", "SIM-PB-%04u", "200-0001",
-     "cpu.fru", nullptr},
-    nullptr};
-const GeneralTextsT FanTexts = {
-    {"Kvi Simulated Systems", "Fan tray", "1.2", "SIM-FAN", "SIM-FT-%04u", "300-0001",
-     "fan.fru", nullptr},
-    nullptr};
-const GeneralTextsT SupplyTexts = {
-    {"Kvi Simulated Systems", "Power supply", "1.0", "SIM-PSU", "SIM-PS-%04u", "400-0001",
-     "psu.fru", nullptr},
-    nullptr};
+const GeneralTextsT ChassisTexts = {{"Kvi Simulated Systems", "Simulated shelf", "1.0", "SIM-SHELF",
+                                     "SIM-CH-%04u", "100-0001", "shelf.fru", nullptr},
+                                    "Simulated hardware"};
+const GeneralTextsT BoardTexts = {{"Kvi Simulated Systems", "Processor board", "2.1", "SIM-CPU",
+                                   "SIM-PB-%04u", "200-0001", "cpu.fru", nullptr},
+                                  nullptr};
+const GeneralTextsT FanTexts = {{"Kvi Simulated Systems", "Fan tray", "1.2", "SIM-FAN",
+                                 "SIM-FT-%04u", "300-0001", "fan.fru", nullptr},
+                                nullptr};
+const GeneralTextsT SupplyTexts = {{"Kvi Simulated Systems", "Power supply", "1.0", "SIM-PSU",
+                                    "SIM-PS-%04u", "400-0001", "psu.fru", nullptr},
+                                   nullptr};
 
 void buildDefault(const SimRecordT *Record, SimInventoryBlobT *Blob) noexcept
 {
@@ -333,14 +329,14 @@ size_t layOut(const SimInventoryBlobT *Blob, void *Base, SaHpiUint32T Size) noex
     if (count > MAX_RECORDS) {
         count = MAX_RECORDS;
     }
-    size_t head = offsetof(SaHpiInventoryDataT, DataRecords) +
-                  (count + 1) * sizeof(SaHpiInventDataRecordT *);
+    size_t head =
+        offsetof(SaHpiInventoryDataT, DataRecords) + (count + 1) * sizeof(SaHpiInventDataRecordT *);
     auto *data = static_cast<SaHpiInventoryDataT *>(
         l.take(head < sizeof(SaHpiInventoryDataT) ? sizeof(SaHpiInventoryDataT) : head));
     SaHpiInventDataRecordT **records =
-        data != nullptr ? tail<SaHpiInventDataRecordT *>(data, offsetof(SaHpiInventoryDataT,
-                                                                          DataRecords))
-                        : nullptr;
+        data != nullptr
+            ? tail<SaHpiInventDataRecordT *>(data, offsetof(SaHpiInventoryDataT, DataRecords))
+            : nullptr;
     if (data != nullptr) {
         data->Validity = validity;
     }
@@ -392,8 +388,8 @@ size_t layOut(const SimInventoryBlobT *Blob, void *Base, SaHpiUint32T Size) noex
         }
         default: { // board and product areas
             SaHpiUint32T customs = customCount(r);
-            record = takeRecord(l, RECORD_DATA + CUSTOM +
-                                       (customs + 1) * sizeof(SaHpiTextBufferT *));
+            record =
+                takeRecord(l, RECORD_DATA + CUSTOM + (customs + 1) * sizeof(SaHpiTextBufferT *));
             length = placeGeneral(l, r, record, 0);
             break;
         }
@@ -416,7 +412,8 @@ size_t layOut(const SimInventoryBlobT *Blob, void *Base, SaHpiUint32T Size) noex
 
 SaErrorT checkText(const SaHpiTextBufferT *Text) noexcept
 {
-    return Text->DataType > SAHPI_TL_TYPE_LANGUAGE || Text->Language > SAHPI_LANG_ZULU
+    return simRaw(Text->DataType) > SAHPI_TL_TYPE_LANGUAGE ||
+                   simRaw(Text->Language) > SAHPI_LANG_ZULU
                ? SA_ERR_HPI_INVALID_PARAMS
                : SA_OK;
 }
@@ -424,7 +421,7 @@ SaErrorT checkText(const SaHpiTextBufferT *Text) noexcept
 SaErrorT putClientGeneral(BlobWriter &W, SaHpiInventGeneralDataT *G) noexcept
 {
     W.put(&G->MfgDateTime, sizeof(G->MfgDateTime));
-    SaHpiTextBufferT *texts[GENERAL_TEXTS] = {G->Manufacturer, G->ProductName, G->ProductVersion,
+    SaHpiTextBufferT *texts[GENERAL_TEXTS] = {G->Manufacturer, G->ProductName,  G->ProductVersion,
                                               G->ModelNumber,  G->SerialNumber, G->PartNumber,
                                               G->FileId,       G->AssetTag};
     for (SaHpiTextBufferT *text : texts) {
@@ -469,8 +466,9 @@ SaErrorT serialize(SaHpiInventoryDataT *Data, SimInventoryBlobT *Blob) noexcept
     for (SaHpiUint32T i = 0; i < count; i++) {
         SaHpiInventDataRecordT *record = records[i];
         SaErrorT rc = SA_OK;
-        w.u8(record->RecordType);
-        switch (record->RecordType) {
+        SaHpiUint32T type = simRaw(record->RecordType);
+        w.u8(type);
+        switch (type) {
         case SAHPI_INVENT_RECTYPE_INTERNAL_USE: {
             if (record->DataLength > SIM_INVENTORY_CAPACITY) {
                 return SA_ERR_HPI_OUT_OF_SPACE;
@@ -495,8 +493,8 @@ SaErrorT serialize(SaHpiInventoryDataT *Data, SimInventoryBlobT *Blob) noexcept
             break;
         }
         case SAHPI_INVENT_RECTYPE_CHASSIS_INFO:
-            if (record->RecordData.ChassisInfo.Type < SAHPI_INVENT_CTYP_OTHER ||
-                record->RecordData.ChassisInfo.Type > SAHPI_INVENT_CTYP_RACKMOUNT) {
+            if (simRaw(record->RecordData.ChassisInfo.Type) < SAHPI_INVENT_CTYP_OTHER ||
+                simRaw(record->RecordData.ChassisInfo.Type) > SAHPI_INVENT_CTYP_RACKMOUNT) {
                 return SA_ERR_HPI_INVALID_PARAMS;
             }
             w.u8(record->RecordData.ChassisInfo.Type);

@@ -6,10 +6,12 @@
 #include <pthread.h>
 
 #include <cstddef>
+#include <cstring>
 
 #include "KviDaemonCore.h"
 
 // ---- Shapes: constant tables, one row per kind of record ----
+// Members default to zero so that a table row names only what it uses.
 
 // Where a sensor's raw reading comes from. Readings are pure functions of
 // the resource's state, so a client sees every set it makes in the next read.
@@ -22,27 +24,27 @@ enum SimReadingSourceT {
 };
 
 struct SimSensorShapeT {
-    const char *IdString; // may hold one %u: the fan number
-    SaHpiSensorTypeT Type;
-    SaHpiEventCategoryT Category;
-    SaHpiSensorEventCtrlT EventCtrl;
-    SaHpiEventStateT Events;
-    SaHpiBoolT IsThreshold;
-    SaHpiSensorUnitsT Units;
-    SaHpiInt16T M;
-    SaHpiInt16T B;
-    SaHpiInt8T ExpR;
-    SaHpiInt8T ExpB;
-    SimReadingSourceT Source;
-    SaHpiUint32T NominalRaw;
-    SaHpiUint32T OffRaw;
+    const char *IdString = {}; // may hold one %u: the fan number
+    SaHpiSensorTypeT Type = {};
+    SaHpiEventCategoryT Category = {};
+    SaHpiSensorEventCtrlT EventCtrl = {};
+    SaHpiEventStateT Events = {};
+    SaHpiBoolT IsThreshold = {};
+    SaHpiSensorUnitsT Units = {};
+    SaHpiInt16T M = {};
+    SaHpiInt16T B = {};
+    SaHpiInt8T ExpR = {};
+    SaHpiInt8T ExpB = {};
+    SimReadingSourceT Source = {};
+    SaHpiUint32T NominalRaw = {};
+    SaHpiUint32T OffRaw = {};
     // Raw thresholds in the order LowCritical, LowMajor, LowMinor, UpCritical,
     // UpMajor, UpMinor, then the positive and negative hysteresis.
-    SaHpiUint32T Thresholds[8];
-    SaHpiSensorThdMaskT ReadThold;
-    SaHpiSensorThdMaskT WriteThold;
-    SaHpiEventStateT AssertEvents;   // enabled at start
-    SaHpiEventStateT DeassertEvents; // enabled at start
+    SaHpiUint32T Thresholds[8] = {};
+    SaHpiSensorThdMaskT ReadThold = {};
+    SaHpiSensorThdMaskT WriteThold = {};
+    SaHpiEventStateT AssertEvents = {};   // enabled at start
+    SaHpiEventStateT DeassertEvents = {}; // enabled at start
 };
 
 // What a control drives besides its own state.
@@ -53,15 +55,15 @@ enum SimControlRoleT {
 };
 
 struct SimControlShapeT {
-    const char *IdString;
-    SaHpiCtrlTypeT Type;
-    SaHpiCtrlOutputTypeT OutputType;
-    SimControlRoleT Role;
-    SaHpiInt32T Min;      // analog
-    SaHpiInt32T Max;      // analog
-    SaHpiInt32T Default;  // digital, discrete, analog
-    const char *Text;     // text default, stream and OEM default bytes
-    SaHpiUint8T Length;   // bytes of Text used by stream and OEM defaults
+    const char *IdString = {};
+    SaHpiCtrlTypeT Type = {};
+    SaHpiCtrlOutputTypeT OutputType = {};
+    SimControlRoleT Role = {};
+    SaHpiInt32T Min = {};     // analog
+    SaHpiInt32T Max = {};     // analog
+    SaHpiInt32T Default = {}; // digital, discrete, analog
+    const char *Text = {};    // text default, stream and OEM default bytes
+    SaHpiUint8T Length = {};  // bytes of Text used by stream and OEM defaults
 };
 
 // Text controls are small displays: a fixed number of lines of fixed width.
@@ -76,8 +78,8 @@ enum SimKindT { SIM_CHASSIS, SIM_PROCESSOR_BOARD, SIM_FAN_TRAY, SIM_POWER_SUPPLY
 
 struct SimRecordShapeT {
     SaHpiRdrTypeT Type;
-    const void *Shape;    // SimSensorShapeT or SimControlShapeT; NULL otherwise
-    SaHpiBoolT PerFan;    // repeated for each fan of a tray
+    const void *Shape; // SimSensorShapeT or SimControlShapeT; NULL otherwise
+    SaHpiBoolT PerFan; // repeated for each fan of a tray
 };
 
 struct SimResourceShapeT {
@@ -105,10 +107,10 @@ struct SimInventoryBlobT {
 
 struct SimSensorStateT {
     const SimSensorShapeT *Shape;
-    SaHpiBoolT Valid[8];       // threshold i holds a value
-    SaHpiUint32T Raw[8];       // raw thresholds, order as in the shape
+    SaHpiBoolT Valid[8]; // threshold i holds a value
+    SaHpiUint32T Raw[8]; // raw thresholds, order as in the shape
     SaHpiSensorEvtEnablesT Enables;
-    SaHpiEventStateT State;    // event state last evaluated
+    SaHpiEventStateT State; // event state last evaluated
     SaHpiBoolT HasSaved;
     SaHpiBoolT SavedValid[8];
     SaHpiUint32T SavedRaw[8];
@@ -117,21 +119,21 @@ struct SimSensorStateT {
 
 struct SimControlStateT {
     const SimControlShapeT *Shape;
-    SaHpiCtrlStateT State;     // for text controls only Type is used
+    SaHpiCtrlStateT State; // for text controls only Type is used
     SaHpiUint8T Display[SIM_TEXT_LINES][SIM_TEXT_CHARS];
     SaHpiUint8T LineLength[SIM_TEXT_LINES];
-    SaHpiUint32T Pulses;       // digital pulses given
+    SaHpiUint32T Pulses; // digital pulses given
     SaHpiBoolT HasSaved;
-    SaHpiCtrlStateT Saved;     // text controls save all lines
+    SaHpiCtrlStateT Saved; // text controls save all lines
 };
 
 struct SimInventoryStateT {
-    SimInventoryBlobT *Data;   // never NULL once discovered
-    SimInventoryBlobT *Saved;  // NULL until a save
+    SimInventoryBlobT *Data;  // never NULL once discovered
+    SimInventoryBlobT *Saved; // NULL until a save
 };
 
 struct SimWatchdogStateT {
-    SaHpiWatchdogT Config;     // Running and PresentCount kept below
+    SaHpiWatchdogT Config; // Running and PresentCount kept below
     SaHpiBoolT Running;
     SaHpiBoolT PreTimeoutFired;
     SaHpiInt64T DeadlineMs;    // monotonic, while running
@@ -146,8 +148,8 @@ struct SimResourceT;
 struct SimRecordT {
     SimResourceT *Resource;
     SaHpiRdrTypeT Type;
-    SaHpiUint8T Num;           // the number the library gave the record
-    SaHpiUint8T Fan;           // 1-based fan number for per-fan records
+    SaHpiUint8T Num; // the number the library gave the record
+    SaHpiUint8T Fan; // 1-based fan number for per-fan records
     SaHpiBoolT Removed;
     union {
         SimSensorStateT Sensor;
@@ -160,13 +162,13 @@ struct SimRecordT {
 constexpr SaHpiUint32T SIM_SEL_DEFAULT_SIZE = 64;
 
 struct SimEventLogT {
-    SaHpiSelEntryT *Entries;   // oldest first; allocated with the first entry
+    SaHpiSelEntryT *Entries; // oldest first; allocated with the first entry
     SaHpiUint32T Count;
     SaHpiUint32T Size;
     SaHpiSelEntryIdT NextId;
     SaHpiBoolT Enabled;
     SaHpiBoolT OverflowFlag;
-    SaHpiTimeT Offset;         // log clock minus HPI time
+    SaHpiTimeT Offset; // log clock minus HPI time
     SaHpiTimeT UpdateTimestamp;
 };
 
@@ -174,19 +176,19 @@ struct SimHotSwapT {
     SaHpiHsStateT State;
     SaHpiHsIndicatorStateT Indicator;
     SaHpiTimeoutT AutoExtractTimeout;
-    SaHpiBoolT Managed;        // a client asked to control hot swap
+    SaHpiBoolT Managed; // a client asked to control hot swap
 };
 
-struct SimResourceParmsT {     // what resource-level parameter control covers
+struct SimResourceParmsT { // what resource-level parameter control covers
     SaHpiBoolT LogEnabled;
     SaHpiTimeoutT AutoExtractTimeout;
     SaHpiHsIndicatorStateT Indicator;
 };
 
 struct SimResourceT {
-    pthread_mutex_t Mutex;     // guards everything below and the records
+    pthread_mutex_t Mutex; // guards everything below and the records
     const SimResourceShapeT *Shape;
-    SaHpiUint32T Instance;     // 1-based within its kind
+    SaHpiUint32T Instance; // 1-based within its kind
     SaHpiDomainIdT DomainId;
     SaHpiResourceIdT ResourceId;
     SaHpiHsPowerStateT PowerState;
@@ -198,8 +200,19 @@ struct SimResourceT {
     SaHpiBoolT HasSavedParms;
     SimResourceParmsT SavedParms;
     SaHpiUint32T RecordCount;
-    SimRecordT *Records;       // in the same block, after this structure
+    SimRecordT *Records; // in the same block, after this structure
 };
+
+// The value of an enumerated field as the client wrote it. A client may pass
+// any number in an enum's bytes; reading such a value as the enum type is
+// undefined in C++, so every check of client input goes through this.
+template <typename E> SaHpiUint32T simRaw(const E &Value) noexcept
+{
+    static_assert(sizeof(E) == sizeof(SaHpiUint32T));
+    SaHpiUint32T raw;
+    memcpy(&raw, &Value, sizeof(raw));
+    return raw;
+}
 
 // What parameter control asks of a record or resource.
 enum SimParmT { SIM_PARM_DEFAULT, SIM_PARM_SAVE, SIM_PARM_RESTORE };
@@ -275,8 +288,8 @@ SaErrorT simWatchdogParm(SimRecordT *Record, SimParmT Action) noexcept;
 
 SaErrorT simEventLogInfoGet(SaHpiDomainIdT, SaHpiResourceIdT, void *, SaHpiSelInfoT *) noexcept;
 SaErrorT simEventLogEntryGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSelEntryIdT, void *,
-                             SaHpiSelEntryIdT *, SaHpiSelEntryIdT *, SaHpiSelEntryT *,
-                             SaHpiRdrT *, SaHpiRptEntryT *) noexcept;
+                             SaHpiSelEntryIdT *, SaHpiSelEntryIdT *, SaHpiSelEntryT *, SaHpiRdrT *,
+                             SaHpiRptEntryT *) noexcept;
 SaErrorT simEventLogEntryAdd(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSelEntryT *, void *) noexcept;
 SaErrorT simEventLogEntryDelete(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSelEntryIdT,
                                 void *) noexcept;
@@ -290,11 +303,9 @@ SaErrorT simResourceActiveSet(SaHpiDomainIdT, SaHpiResourceIdT, void *) noexcept
 SaErrorT simResourceInactiveSet(SaHpiDomainIdT, SaHpiResourceIdT, void *) noexcept;
 SaErrorT simAutoExtractTimeoutGet(SaHpiDomainIdT, SaHpiResourceIdT, void *,
                                   SaHpiTimeoutT *) noexcept;
-SaErrorT simAutoExtractTimeoutSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiTimeoutT,
-                                  void *) noexcept;
+SaErrorT simAutoExtractTimeoutSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiTimeoutT, void *) noexcept;
 SaErrorT simHotSwapStateGet(SaHpiDomainIdT, SaHpiResourceIdT, void *, SaHpiHsStateT *) noexcept;
-SaErrorT simHotSwapActionRequest(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiHsActionT,
-                                 void *) noexcept;
+SaErrorT simHotSwapActionRequest(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiHsActionT, void *) noexcept;
 SaErrorT simResourcePowerStateGet(SaHpiDomainIdT, SaHpiResourceIdT, void *,
                                   SaHpiHsPowerStateT *) noexcept;
 SaErrorT simResourcePowerStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiHsPowerStateT,
@@ -315,9 +326,8 @@ SaErrorT simRptRestoreParmControl(SaHpiDomainIdT, SaHpiResourceIdT, KviDsRptFnTa
 
 // ---- Slots of the record table ----
 
-SaErrorT simSensorReadingGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT,
-                             SaHpiEventCategoryT, SaHpiRdrT *, void *,
-                             SaHpiSensorReadingT *) noexcept;
+SaErrorT simSensorReadingGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT, SaHpiEventCategoryT,
+                             SaHpiRdrT *, void *, SaHpiSensorReadingT *) noexcept;
 SaErrorT simSensorReadingConvert(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT, SaHpiRdrT *,
                                  SaHpiSensorReadingT *, void *, SaHpiSensorReadingT *) noexcept;
 SaErrorT simSensorThresholdsGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT, SaHpiRdrT *,
@@ -336,8 +346,8 @@ SaErrorT simControlStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiCtrlNumT, SaH
                             void *) noexcept;
 SaErrorT simWatchdogTimerGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiWatchdogNumT, void *,
                              SaHpiWatchdogT *) noexcept;
-SaErrorT simWatchdogTimerSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiWatchdogNumT,
-                             SaHpiWatchdogT *, void *) noexcept;
+SaErrorT simWatchdogTimerSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiWatchdogNumT, SaHpiWatchdogT *,
+                             void *) noexcept;
 SaErrorT simWatchdogTimerReset(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiWatchdogNumT,
                                void *) noexcept;
 SaErrorT simEntityInventoryDataRead(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiEirIdT, SaHpiUint32T,
@@ -346,8 +356,8 @@ SaErrorT simEntityInventoryDataWrite(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiEirI
                                      SaHpiInventoryDataT *, void *) noexcept;
 SaErrorT simActiveAlarmTranslate(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT, void *,
                                  SaHpiRdrT *, SaHpiRptEntryT *, SaHpiEventT *) noexcept;
-SaErrorT simRdrDefaultParmControl(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRdrT *,
-                                  KviDsRdrFnTable *, void *) noexcept;
+SaErrorT simRdrDefaultParmControl(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRdrT *, KviDsRdrFnTable *,
+                                  void *) noexcept;
 SaErrorT simRdrSaveParmControl(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRdrT *, KviDsRdrFnTable *,
                                void *) noexcept;
 SaErrorT simRdrRestoreParmControl(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiBoolT, SaHpiRdrT *,

@@ -3,16 +3,22 @@
 // long as the plug-in stays loaded.
 #include "SimModel.h"
 
-namespace {
+namespace
+{
 
 SaErrorT recordParm(SimRecordT *Record, SimParmT Action) noexcept
 {
     switch (Record->Type) {
-    case SAHPI_SENSOR_RDR: return simSensorParm(Record, Action);
-    case SAHPI_CTRL_RDR: return simControlParm(Record, Action);
-    case SAHPI_INVENTORY_RDR: return simInventoryParm(Record, Action);
-    case SAHPI_WATCHDOG_RDR: return simWatchdogParm(Record, Action);
-    default: return SA_ERR_HPI_INVALID_PARAMS;
+    case SAHPI_SENSOR_RDR:
+        return simSensorParm(Record, Action);
+    case SAHPI_CTRL_RDR:
+        return simControlParm(Record, Action);
+    case SAHPI_INVENTORY_RDR:
+        return simInventoryParm(Record, Action);
+    case SAHPI_WATCHDOG_RDR:
+        return simWatchdogParm(Record, Action);
+    default:
+        return SA_ERR_HPI_INVALID_PARAMS;
     }
 }
 
@@ -83,8 +89,8 @@ SaErrorT simRptRestoreParmControl(SaHpiDomainIdT, SaHpiResourceIdT, KviDsRptFnTa
 
 // ---- Record level ----
 
-SaErrorT simRdrDefaultParmControl(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRdrT *,
-                                  KviDsRdrFnTable *, void *UserData) noexcept
+SaErrorT simRdrDefaultParmControl(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRdrT *, KviDsRdrFnTable *,
+                                  void *UserData) noexcept
 {
     return recordSlot(UserData, SIM_PARM_DEFAULT, SAHPI_FALSE);
 }

@@ -4,7 +4,8 @@
 // plug-in that answers them.
 #include "SimModel.h"
 
-namespace {
+namespace
+{
 
 constexpr SaHpiTimeoutT AUTO_EXTRACT_TIMEOUT = 5000000000LL; // 5 s
 
@@ -69,7 +70,7 @@ SaErrorT simResourcePowerStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiHsPower
         return SA_ERR_HPI_INVALID_PARAMS;
     }
     SimLock lock(resource);
-    switch (State) {
+    switch (simRaw(State)) {
     case SAHPI_HS_POWER_OFF:
     case SAHPI_HS_POWER_ON:
         resource->PowerState = State;
@@ -113,7 +114,7 @@ SaErrorT simResourceResetStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiResetAc
         return SA_ERR_HPI_INVALID_PARAMS;
     }
     SimLock lock(resource);
-    switch (ResetAction) {
+    switch (simRaw(ResetAction)) {
     case SAHPI_COLD_RESET:
     case SAHPI_WARM_RESET:
         // A resource held in reset has to be let go first.
@@ -132,7 +133,7 @@ SaErrorT simResourceResetStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiResetAc
         return SA_ERR_HPI_INVALID_PARAMS;
     }
     // A reset stops the resource's watchdogs, as on real boards.
-    if (ResetAction != SAHPI_RESET_DEASSERT) {
+    if (simRaw(ResetAction) != SAHPI_RESET_DEASSERT) {
         for (SaHpiUint32T i = 0; i < resource->RecordCount; i++) {
             if (resource->Records[i].Type == SAHPI_WATCHDOG_RDR) {
                 simWatchdogStop(&resource->Records[i]);
@@ -237,7 +238,7 @@ SaErrorT simHotSwapActionRequest(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiHsAction
     }
     SimLock lock(resource);
     SimHotSwapT &hs = resource->HotSwap;
-    switch (Action) {
+    switch (simRaw(Action)) {
     case SAHPI_HS_ACTION_INSERTION:
         if (hs.State != SAHPI_HS_STATE_INACTIVE) {
             return SA_ERR_HPI_INVALID_REQUEST;
@@ -268,12 +269,12 @@ SaErrorT simHotSwapIndicatorStateGet(SaHpiDomainIdT, SaHpiResourceIdT, void *Use
     return SA_OK;
 }
 
-SaErrorT simHotSwapIndicatorStateSet(SaHpiDomainIdT, SaHpiResourceIdT,
-                                     SaHpiHsIndicatorStateT State, void *UserDefined) noexcept
+SaErrorT simHotSwapIndicatorStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiHsIndicatorStateT State,
+                                     void *UserDefined) noexcept
 {
     SimResourceT *resource = resourceOf(UserDefined);
     if (resource == nullptr ||
-        (State != SAHPI_HS_INDICATOR_OFF && State != SAHPI_HS_INDICATOR_ON)) {
+        (simRaw(State) != SAHPI_HS_INDICATOR_OFF && simRaw(State) != SAHPI_HS_INDICATOR_ON)) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
     SimLock lock(resource);

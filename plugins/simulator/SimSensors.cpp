@@ -5,7 +5,8 @@
 
 #include "SimModel.h"
 
-namespace {
+namespace
+{
 
 constexpr SaHpiUint32T RAW_MAX = 255;
 constexpr SaHpiUint32T POS_HYSTERESIS = 6;
@@ -14,16 +15,16 @@ constexpr SaHpiUint32T NEG_HYSTERESIS = 7;
 // Threshold i of SaHpiSensorThresholdsT order, its mask bit and the event
 // state that its crossing asserts.
 constexpr SaHpiSensorThdMaskT ThresholdMask[8] = {
-    SAHPI_STM_LOW_CRIT, SAHPI_STM_LOW_MAJOR, SAHPI_STM_LOW_MINOR, SAHPI_STM_UP_CRIT,
-    SAHPI_STM_UP_MAJOR, SAHPI_STM_UP_MINOR, SAHPI_STM_UP_HYSTERESIS, SAHPI_STM_LOW_HYSTERESIS};
+    SAHPI_STM_LOW_CRIT, SAHPI_STM_LOW_MAJOR, SAHPI_STM_LOW_MINOR,     SAHPI_STM_UP_CRIT,
+    SAHPI_STM_UP_MAJOR, SAHPI_STM_UP_MINOR,  SAHPI_STM_UP_HYSTERESIS, SAHPI_STM_LOW_HYSTERESIS};
 constexpr SaHpiEventStateT ThresholdState[6] = {SAHPI_ES_LOWER_CRIT,  SAHPI_ES_LOWER_MAJOR,
                                                 SAHPI_ES_LOWER_MINOR, SAHPI_ES_UPPER_CRIT,
                                                 SAHPI_ES_UPPER_MAJOR, SAHPI_ES_UPPER_MINOR};
 
 SaHpiSensorReadingT *thresholdField(SaHpiSensorThresholdsT *T, SaHpiUint32T I) noexcept
 {
-    SaHpiSensorReadingT *fields[8] = {&T->LowCritical, &T->LowMajor,         &T->LowMinor,
-                                      &T->UpCritical,  &T->UpMajor,          &T->UpMinor,
+    SaHpiSensorReadingT *fields[8] = {&T->LowCritical,      &T->LowMajor,        &T->LowMinor,
+                                      &T->UpCritical,       &T->UpMajor,         &T->UpMinor,
                                       &T->PosThdHysteresis, &T->NegThdHysteresis};
     return fields[I];
 }
@@ -64,15 +65,30 @@ SaErrorT toRaw(const SimSensorShapeT *S, double Value, bool Offset, SaHpiUint32T
 
 bool interpretedValue(const SaHpiSensorInterpretedT *I, double *Value) noexcept
 {
-    switch (I->Type) {
-    case SAHPI_SENSOR_INTERPRETED_TYPE_UINT8: *Value = I->Value.SensorUint8; return true;
-    case SAHPI_SENSOR_INTERPRETED_TYPE_UINT16: *Value = I->Value.SensorUint16; return true;
-    case SAHPI_SENSOR_INTERPRETED_TYPE_UINT32: *Value = I->Value.SensorUint32; return true;
-    case SAHPI_SENSOR_INTERPRETED_TYPE_INT8: *Value = I->Value.SensorInt8; return true;
-    case SAHPI_SENSOR_INTERPRETED_TYPE_INT16: *Value = I->Value.SensorInt16; return true;
-    case SAHPI_SENSOR_INTERPRETED_TYPE_INT32: *Value = I->Value.SensorInt32; return true;
-    case SAHPI_SENSOR_INTERPRETED_TYPE_FLOAT32: *Value = I->Value.SensorFloat32; return true;
-    default: return false;
+    switch (simRaw(I->Type)) {
+    case SAHPI_SENSOR_INTERPRETED_TYPE_UINT8:
+        *Value = I->Value.SensorUint8;
+        return true;
+    case SAHPI_SENSOR_INTERPRETED_TYPE_UINT16:
+        *Value = I->Value.SensorUint16;
+        return true;
+    case SAHPI_SENSOR_INTERPRETED_TYPE_UINT32:
+        *Value = I->Value.SensorUint32;
+        return true;
+    case SAHPI_SENSOR_INTERPRETED_TYPE_INT8:
+        *Value = I->Value.SensorInt8;
+        return true;
+    case SAHPI_SENSOR_INTERPRETED_TYPE_INT16:
+        *Value = I->Value.SensorInt16;
+        return true;
+    case SAHPI_SENSOR_INTERPRETED_TYPE_INT32:
+        *Value = I->Value.SensorInt32;
+        return true;
+    case SAHPI_SENSOR_INTERPRETED_TYPE_FLOAT32:
+        *Value = I->Value.SensorFloat32;
+        return true;
+    default:
+        return false;
     }
 }
 
@@ -187,10 +203,14 @@ SaHpiSeverityT severityOf(const SimSensorShapeT *S, SaHpiEventStateT Bit) noexce
 SaHpiEventStateT alarmsOf(const SimSensorShapeT *S, SaHpiEventStateT State) noexcept
 {
     switch (S->Category) {
-    case SAHPI_EC_THRESHOLD: return State & (0x3F);
-    case SAHPI_EC_AVAILABILITY: return State & SAHPI_ES_POWER_OFF;
-    case SAHPI_EC_STATE: return State & SAHPI_ES_STATE_ASSERTED;
-    default: return 0;
+    case SAHPI_EC_THRESHOLD:
+        return State & (0x3F);
+    case SAHPI_EC_AVAILABILITY:
+        return State & SAHPI_ES_POWER_OFF;
+    case SAHPI_EC_STATE:
+        return State & SAHPI_ES_STATE_ASSERTED;
+    default:
+        return 0;
     }
 }
 
@@ -245,7 +265,8 @@ SaHpiUint32T evaluate(SimRecordT *Record) noexcept
         st.Shape->EventCtrl == SAHPI_SEC_NO_EVENTS) {
         return raw;
     }
-    for (SaHpiEventStateT bit = 1; bit != 0 && bit <= 0x4000; bit = static_cast<SaHpiEventStateT>(bit << 1)) {
+    for (SaHpiEventStateT bit = 1; bit != 0 && bit <= 0x4000;
+         bit = static_cast<SaHpiEventStateT>(bit << 1)) {
         if (!(changed & bit)) {
             continue;
         }
@@ -387,9 +408,8 @@ SaErrorT simSensorParm(SimRecordT *Record, SimParmT Action) noexcept
 
 // ---- Slots ----
 
-SaErrorT simSensorReadingGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT,
-                             SaHpiEventCategoryT, SaHpiRdrT *, void *UserData,
-                             SaHpiSensorReadingT *Reading) noexcept
+SaErrorT simSensorReadingGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT, SaHpiEventCategoryT,
+                             SaHpiRdrT *, void *UserData, SaHpiSensorReadingT *Reading) noexcept
 {
     SimRecordT *record = sensorOf(UserData);
     if (record == nullptr || Reading == nullptr) {
@@ -521,8 +541,8 @@ SaErrorT simSensorThresholdsSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNum
     return SA_OK;
 }
 
-SaErrorT simSensorEventEnablesGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT,
-                                  void *UserData, SaHpiCapabilitiesT, SaHpiEventCategoryT,
+SaErrorT simSensorEventEnablesGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT, void *UserData,
+                                  SaHpiCapabilitiesT, SaHpiEventCategoryT,
                                   SaHpiSensorEvtEnablesT *Enables) noexcept
 {
     SimRecordT *record = sensorOf(UserData);
@@ -538,8 +558,8 @@ SaErrorT simSensorEventEnablesGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorN
 }
 
 SaErrorT simSensorEventEnablesSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT,
-                                  SaHpiSensorEvtEnablesT *Enables, SaHpiRdrT *,
-                                  SaHpiCapabilitiesT, void *UserData) noexcept
+                                  SaHpiSensorEvtEnablesT *Enables, SaHpiRdrT *, SaHpiCapabilitiesT,
+                                  void *UserData) noexcept
 {
     SimRecordT *record = sensorOf(UserData);
     if (record == nullptr || Enables == nullptr) {
@@ -554,8 +574,8 @@ SaErrorT simSensorEventEnablesSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorN
     if (s->EventCtrl == SAHPI_SEC_NO_EVENTS) {
         return SA_ERR_HPI_INVALID_CMD;
     }
-    constexpr SaHpiSensorStatusT writable = SAHPI_SENSTAT_EVENTS_ENABLED |
-                                            SAHPI_SENSTAT_SCAN_ENABLED;
+    constexpr SaHpiSensorStatusT writable =
+        SAHPI_SENSTAT_EVENTS_ENABLED | SAHPI_SENSTAT_SCAN_ENABLED;
     if (Enables->SensorStatus & ~(writable | SAHPI_SENSTAT_BUSY)) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
@@ -572,9 +592,8 @@ SaErrorT simSensorEventEnablesSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorN
     return SA_OK;
 }
 
-SaErrorT simActiveAlarmTranslate(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT,
-                                 void *UserData, SaHpiRdrT *, SaHpiRptEntryT *,
-                                 SaHpiEventT *Event) noexcept
+SaErrorT simActiveAlarmTranslate(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT, void *UserData,
+                                 SaHpiRdrT *, SaHpiRptEntryT *, SaHpiEventT *Event) noexcept
 {
     SimRecordT *record = sensorOf(UserData);
     if (record == nullptr || Event == nullptr) {
@@ -592,7 +611,8 @@ SaErrorT simActiveAlarmTranslate(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNu
     // The most severe state stands for the sensor.
     SaHpiEventStateT worst = 0;
     SaHpiSeverityT severity = SAHPI_OK;
-    for (SaHpiEventStateT bit = 1; bit != 0 && bit <= 0x4000; bit = static_cast<SaHpiEventStateT>(bit << 1)) {
+    for (SaHpiEventStateT bit = 1; bit != 0 && bit <= 0x4000;
+         bit = static_cast<SaHpiEventStateT>(bit << 1)) {
         if ((alarms & bit) && (worst == 0 || severityOf(record->Sensor.Shape, bit) < severity)) {
             worst = bit;
             severity = severityOf(record->Sensor.Shape, bit);

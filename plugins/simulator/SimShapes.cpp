@@ -3,17 +3,17 @@
 // shelf means changing these tables only.
 #include "SimModel.h"
 
-namespace {
+namespace
+{
 
-constexpr SaHpiEventStateT LOWER_ALL = SAHPI_ES_LOWER_MINOR | SAHPI_ES_LOWER_MAJOR |
-                                       SAHPI_ES_LOWER_CRIT;
-constexpr SaHpiEventStateT UPPER_ALL = SAHPI_ES_UPPER_MINOR | SAHPI_ES_UPPER_MAJOR |
-                                       SAHPI_ES_UPPER_CRIT;
+constexpr SaHpiEventStateT LOWER_ALL =
+    SAHPI_ES_LOWER_MINOR | SAHPI_ES_LOWER_MAJOR | SAHPI_ES_LOWER_CRIT;
+constexpr SaHpiEventStateT UPPER_ALL =
+    SAHPI_ES_UPPER_MINOR | SAHPI_ES_UPPER_MAJOR | SAHPI_ES_UPPER_CRIT;
 constexpr SaHpiSensorThdMaskT HYSTERESIS = SAHPI_STM_UP_HYSTERESIS | SAHPI_STM_LOW_HYSTERESIS;
-constexpr SaHpiSensorThdMaskT LOW_ALL = SAHPI_STM_LOW_MINOR | SAHPI_STM_LOW_MAJOR |
-                                        SAHPI_STM_LOW_CRIT;
-constexpr SaHpiSensorThdMaskT UP_ALL = SAHPI_STM_UP_MINOR | SAHPI_STM_UP_MAJOR |
-                                       SAHPI_STM_UP_CRIT;
+constexpr SaHpiSensorThdMaskT LOW_ALL =
+    SAHPI_STM_LOW_MINOR | SAHPI_STM_LOW_MAJOR | SAHPI_STM_LOW_CRIT;
+constexpr SaHpiSensorThdMaskT UP_ALL = SAHPI_STM_UP_MINOR | SAHPI_STM_UP_MAJOR | SAHPI_STM_UP_CRIT;
 // Minor and major limits are the operator's to move; critical ones are fixed.
 constexpr SaHpiSensorThdMaskT LOW_WRITABLE = SAHPI_STM_LOW_MINOR | SAHPI_STM_LOW_MAJOR;
 constexpr SaHpiSensorThdMaskT UP_WRITABLE = SAHPI_STM_UP_MINOR | SAHPI_STM_UP_MAJOR;
@@ -24,105 +24,226 @@ constexpr SaHpiSensorThdMaskT UP_WRITABLE = SAHPI_STM_UP_MINOR | SAHPI_STM_UP_MA
 
 // degrees C = raw
 const SimSensorShapeT InletTemperature = {
-    "Inlet temperature", SAHPI_TEMPERATURE, SAHPI_EC_THRESHOLD, SAHPI_SEC_PER_EVENT,
-    LOWER_ALL | UPPER_ALL, SAHPI_TRUE, SAHPI_SU_DEGREES_C, 1, 0, 0, 0,
-    SIM_SRC_FIXED, 25, 25,
-    {5, 8, 10, 45, 40, 35, 2, 2},
-    LOW_ALL | UP_ALL | HYSTERESIS, LOW_WRITABLE | UP_WRITABLE | HYSTERESIS,
-    LOWER_ALL | UPPER_ALL, LOWER_ALL | UPPER_ALL};
+    .IdString = "Inlet temperature",
+    .Type = SAHPI_TEMPERATURE,
+    .Category = SAHPI_EC_THRESHOLD,
+    .EventCtrl = SAHPI_SEC_PER_EVENT,
+    .Events = LOWER_ALL | UPPER_ALL,
+    .IsThreshold = SAHPI_TRUE,
+    .Units = SAHPI_SU_DEGREES_C,
+    .M = 1,
+    .Source = SIM_SRC_FIXED,
+    .NominalRaw = 25,
+    .OffRaw = 25,
+    .Thresholds = {5, 8, 10, 45, 40, 35, 2, 2},
+    .ReadThold = LOW_ALL | UP_ALL | HYSTERESIS,
+    .WriteThold = LOW_WRITABLE | UP_WRITABLE | HYSTERESIS,
+    .AssertEvents = LOWER_ALL | UPPER_ALL,
+    .DeassertEvents = LOWER_ALL | UPPER_ALL,
+};
 
 const SimSensorShapeT ChassisIntrusion = {
-    "Chassis intrusion", SAHPI_PHYSICAL_SECURITY, SAHPI_EC_STATE, SAHPI_SEC_PER_EVENT,
-    SAHPI_ES_STATE_DEASSERTED | SAHPI_ES_STATE_ASSERTED, SAHPI_FALSE, SAHPI_SU_UNSPECIFIED,
-    0, 0, 0, 0,
-    SIM_SRC_INTRUSION, 0, 0,
-    {0, 0, 0, 0, 0, 0, 0, 0},
-    0, 0,
-    SAHPI_ES_STATE_ASSERTED, SAHPI_ES_STATE_ASSERTED};
+    .IdString = "Chassis intrusion",
+    .Type = SAHPI_PHYSICAL_SECURITY,
+    .Category = SAHPI_EC_STATE,
+    .EventCtrl = SAHPI_SEC_PER_EVENT,
+    .Events = SAHPI_ES_STATE_DEASSERTED | SAHPI_ES_STATE_ASSERTED,
+    .Units = SAHPI_SU_UNSPECIFIED,
+    .Source = SIM_SRC_INTRUSION,
+    .AssertEvents = SAHPI_ES_STATE_ASSERTED,
+    .DeassertEvents = SAHPI_ES_STATE_ASSERTED,
+};
 
 const SimSensorShapeT CpuTemperature = {
-    "CPU temperature", SAHPI_TEMPERATURE, SAHPI_EC_THRESHOLD, SAHPI_SEC_PER_EVENT,
-    UPPER_ALL, SAHPI_TRUE, SAHPI_SU_DEGREES_C, 1, 0, 0, 0,
-    SIM_SRC_POWERED, 45, 25,
-    {0, 0, 0, 90, 80, 70, 2, 2},
-    UP_ALL | HYSTERESIS, UP_WRITABLE | HYSTERESIS,
-    UPPER_ALL, UPPER_ALL};
+    .IdString = "CPU temperature",
+    .Type = SAHPI_TEMPERATURE,
+    .Category = SAHPI_EC_THRESHOLD,
+    .EventCtrl = SAHPI_SEC_PER_EVENT,
+    .Events = UPPER_ALL,
+    .IsThreshold = SAHPI_TRUE,
+    .Units = SAHPI_SU_DEGREES_C,
+    .M = 1,
+    .Source = SIM_SRC_POWERED,
+    .NominalRaw = 45,
+    .OffRaw = 25,
+    .Thresholds = {0, 0, 0, 90, 80, 70, 2, 2},
+    .ReadThold = UP_ALL | HYSTERESIS,
+    .WriteThold = UP_WRITABLE | HYSTERESIS,
+    .AssertEvents = UPPER_ALL,
+    .DeassertEvents = UPPER_ALL,
+};
 
 // volts = raw * 0.02
 const SimSensorShapeT Board3V3 = {
-    "Board 3.3V", SAHPI_VOLTAGE, SAHPI_EC_THRESHOLD, SAHPI_SEC_PER_EVENT,
-    LOWER_ALL | UPPER_ALL, SAHPI_TRUE, SAHPI_SU_VOLTS, 2, 0, -2, 0,
-    SIM_SRC_POWERED, 165, 0,
-    {149, 155, 157, 181, 175, 172, 1, 1},
-    LOW_ALL | UP_ALL | HYSTERESIS, LOW_WRITABLE | UP_WRITABLE | HYSTERESIS,
-    LOWER_ALL | UPPER_ALL, LOWER_ALL | UPPER_ALL};
+    .IdString = "Board 3.3V",
+    .Type = SAHPI_VOLTAGE,
+    .Category = SAHPI_EC_THRESHOLD,
+    .EventCtrl = SAHPI_SEC_PER_EVENT,
+    .Events = LOWER_ALL | UPPER_ALL,
+    .IsThreshold = SAHPI_TRUE,
+    .Units = SAHPI_SU_VOLTS,
+    .M = 2,
+    .ExpR = -2,
+    .Source = SIM_SRC_POWERED,
+    .NominalRaw = 165,
+    .Thresholds = {149, 155, 157, 181, 175, 172, 1, 1},
+    .ReadThold = LOW_ALL | UP_ALL | HYSTERESIS,
+    .WriteThold = LOW_WRITABLE | UP_WRITABLE | HYSTERESIS,
+    .AssertEvents = LOWER_ALL | UPPER_ALL,
+    .DeassertEvents = LOWER_ALL | UPPER_ALL,
+};
 
 // volts = raw * 0.06
 const SimSensorShapeT Board12V = {
-    "Board 12V", SAHPI_VOLTAGE, SAHPI_EC_THRESHOLD, SAHPI_SEC_PER_EVENT,
-    LOWER_ALL | UPPER_ALL, SAHPI_TRUE, SAHPI_SU_VOLTS, 6, 0, -2, 0,
-    SIM_SRC_POWERED, 200, 0,
-    {180, 190, 193, 220, 210, 207, 1, 1},
-    LOW_ALL | UP_ALL | HYSTERESIS, LOW_WRITABLE | UP_WRITABLE | HYSTERESIS,
-    LOWER_ALL | UPPER_ALL, LOWER_ALL | UPPER_ALL};
+    .IdString = "Board 12V",
+    .Type = SAHPI_VOLTAGE,
+    .Category = SAHPI_EC_THRESHOLD,
+    .EventCtrl = SAHPI_SEC_PER_EVENT,
+    .Events = LOWER_ALL | UPPER_ALL,
+    .IsThreshold = SAHPI_TRUE,
+    .Units = SAHPI_SU_VOLTS,
+    .M = 6,
+    .ExpR = -2,
+    .Source = SIM_SRC_POWERED,
+    .NominalRaw = 200,
+    .Thresholds = {180, 190, 193, 220, 210, 207, 1, 1},
+    .ReadThold = LOW_ALL | UP_ALL | HYSTERESIS,
+    .WriteThold = LOW_WRITABLE | UP_WRITABLE | HYSTERESIS,
+    .AssertEvents = LOWER_ALL | UPPER_ALL,
+    .DeassertEvents = LOWER_ALL | UPPER_ALL,
+};
 
 // RPM = raw * 50; the fan-speed control sets raw = percent * 8 / 5.
 const SimSensorShapeT FanSpeed = {
-    "Fan %u speed", SAHPI_FAN, SAHPI_EC_THRESHOLD, SAHPI_SEC_PER_EVENT,
-    LOWER_ALL, SAHPI_TRUE, SAHPI_SU_RPM, 50, 0, 0, 0,
-    SIM_SRC_FAN, 96, 0,
-    {20, 30, 40, 0, 0, 0, 2, 2},
-    LOW_ALL | HYSTERESIS, LOW_WRITABLE | HYSTERESIS,
-    LOWER_ALL, LOWER_ALL};
+    .IdString = "Fan %u speed",
+    .Type = SAHPI_FAN,
+    .Category = SAHPI_EC_THRESHOLD,
+    .EventCtrl = SAHPI_SEC_PER_EVENT,
+    .Events = LOWER_ALL,
+    .IsThreshold = SAHPI_TRUE,
+    .Units = SAHPI_SU_RPM,
+    .M = 50,
+    .Source = SIM_SRC_FAN,
+    .NominalRaw = 96,
+    .Thresholds = {20, 30, 40, 0, 0, 0, 2, 2},
+    .ReadThold = LOW_ALL | HYSTERESIS,
+    .WriteThold = LOW_WRITABLE | HYSTERESIS,
+    .AssertEvents = LOWER_ALL,
+    .DeassertEvents = LOWER_ALL,
+};
 
 const SimSensorShapeT SupplyOutput = {
-    "Output 12V", SAHPI_VOLTAGE, SAHPI_EC_THRESHOLD, SAHPI_SEC_PER_EVENT,
-    LOWER_ALL | UPPER_ALL, SAHPI_TRUE, SAHPI_SU_VOLTS, 6, 0, -2, 0,
-    SIM_SRC_POWERED, 200, 0,
-    {180, 190, 193, 220, 210, 207, 1, 1},
-    LOW_ALL | UP_ALL | HYSTERESIS, LOW_WRITABLE | UP_WRITABLE | HYSTERESIS,
-    LOWER_ALL | UPPER_ALL, LOWER_ALL | UPPER_ALL};
+    .IdString = "Output 12V",
+    .Type = SAHPI_VOLTAGE,
+    .Category = SAHPI_EC_THRESHOLD,
+    .EventCtrl = SAHPI_SEC_PER_EVENT,
+    .Events = LOWER_ALL | UPPER_ALL,
+    .IsThreshold = SAHPI_TRUE,
+    .Units = SAHPI_SU_VOLTS,
+    .M = 6,
+    .ExpR = -2,
+    .Source = SIM_SRC_POWERED,
+    .NominalRaw = 200,
+    .Thresholds = {180, 190, 193, 220, 210, 207, 1, 1},
+    .ReadThold = LOW_ALL | UP_ALL | HYSTERESIS,
+    .WriteThold = LOW_WRITABLE | UP_WRITABLE | HYSTERESIS,
+    .AssertEvents = LOWER_ALL | UPPER_ALL,
+    .DeassertEvents = LOWER_ALL | UPPER_ALL,
+};
 
 const SimSensorShapeT SupplyTemperature = {
-    "Supply temperature", SAHPI_TEMPERATURE, SAHPI_EC_THRESHOLD, SAHPI_SEC_PER_EVENT,
-    UPPER_ALL, SAHPI_TRUE, SAHPI_SU_DEGREES_C, 1, 0, 0, 0,
-    SIM_SRC_POWERED, 40, 25,
-    {0, 0, 0, 80, 70, 60, 2, 2},
-    UP_ALL | HYSTERESIS, UP_WRITABLE | HYSTERESIS,
-    UPPER_ALL, UPPER_ALL};
+    .IdString = "Supply temperature",
+    .Type = SAHPI_TEMPERATURE,
+    .Category = SAHPI_EC_THRESHOLD,
+    .EventCtrl = SAHPI_SEC_PER_EVENT,
+    .Events = UPPER_ALL,
+    .IsThreshold = SAHPI_TRUE,
+    .Units = SAHPI_SU_DEGREES_C,
+    .M = 1,
+    .Source = SIM_SRC_POWERED,
+    .NominalRaw = 40,
+    .OffRaw = 25,
+    .Thresholds = {0, 0, 0, 80, 70, 60, 2, 2},
+    .ReadThold = UP_ALL | HYSTERESIS,
+    .WriteThold = UP_WRITABLE | HYSTERESIS,
+    .AssertEvents = UPPER_ALL,
+    .DeassertEvents = UPPER_ALL,
+};
 
 const SimSensorShapeT SupplyStatus = {
-    "Supply status", SAHPI_POWER_SUPPLY, SAHPI_EC_AVAILABILITY, SAHPI_SEC_PER_EVENT,
-    SAHPI_ES_RUNNING | SAHPI_ES_POWER_OFF, SAHPI_FALSE, SAHPI_SU_UNSPECIFIED, 0, 0, 0, 0,
-    SIM_SRC_AVAILABILITY, 0, 0,
-    {0, 0, 0, 0, 0, 0, 0, 0},
-    0, 0,
-    SAHPI_ES_RUNNING | SAHPI_ES_POWER_OFF, 0};
+    .IdString = "Supply status",
+    .Type = SAHPI_POWER_SUPPLY,
+    .Category = SAHPI_EC_AVAILABILITY,
+    .EventCtrl = SAHPI_SEC_PER_EVENT,
+    .Events = SAHPI_ES_RUNNING | SAHPI_ES_POWER_OFF,
+    .Units = SAHPI_SU_UNSPECIFIED,
+    .Source = SIM_SRC_AVAILABILITY,
+    .AssertEvents = SAHPI_ES_RUNNING | SAHPI_ES_POWER_OFF,
+};
 
 // Controls: one of every type on the chassis, and one that acts on the
 // readings on each other resource.
-const SimControlShapeT AlarmLed = {"Alarm LED", SAHPI_CTRL_TYPE_DIGITAL, SAHPI_CTRL_LED,
-                                   SIM_CTRL_PLAIN, 0, 0, SAHPI_CTRL_STATE_OFF, nullptr, 0};
-const SimControlShapeT OperatingMode = {"Operating mode", SAHPI_CTRL_TYPE_DISCRETE,
-                                        SAHPI_CTRL_GENERIC, SIM_CTRL_PLAIN, 0, 0, 1, nullptr, 0};
-const SimControlShapeT DisplayBrightness = {"Display brightness", SAHPI_CTRL_TYPE_ANALOG,
-                                            SAHPI_CTRL_GENERIC, SIM_CTRL_PLAIN, 0, 100, 75,
-                                            nullptr, 0};
-const SimControlShapeT BuzzerPattern = {"Buzzer pattern", SAHPI_CTRL_TYPE_STREAM,
-                                        SAHPI_CTRL_AUDIBLE, SIM_CTRL_PLAIN, 0, 0, 0,
-                                        "\x01\x00", 2};
-const SimControlShapeT FrontPanel = {"Front panel display", SAHPI_CTRL_TYPE_TEXT,
-                                     SAHPI_CTRL_LCD_DISPLAY, SIM_CTRL_PLAIN, 0, 0, 0,
-                                     "Kvi simulator   shelf ready", 0};
-const SimControlShapeT OemSettings = {"OEM settings", SAHPI_CTRL_TYPE_OEM, SAHPI_CTRL_OEM,
-                                      SIM_CTRL_PLAIN, 0, 0, 0, "\x01\x02\x03", 3};
-const SimControlShapeT HealthLed = {"Health LED", SAHPI_CTRL_TYPE_DIGITAL, SAHPI_CTRL_LED,
-                                    SIM_CTRL_PLAIN, 0, 0, SAHPI_CTRL_STATE_ON, nullptr, 0};
-const SimControlShapeT FanControl = {"Fan speed", SAHPI_CTRL_TYPE_ANALOG, SAHPI_CTRL_FAN_SPEED,
-                                     SIM_CTRL_FAN_SPEED, 20, 100, 60, nullptr, 0};
-const SimControlShapeT PowerInhibit = {"Power inhibit", SAHPI_CTRL_TYPE_DIGITAL,
-                                       SAHPI_CTRL_POWER_SUPPLY_INHIBIT, SIM_CTRL_POWER_INHIBIT,
-                                       0, 0, SAHPI_CTRL_STATE_OFF, nullptr, 0};
+const SimControlShapeT AlarmLed = {
+    .IdString = "Alarm LED",
+    .Type = SAHPI_CTRL_TYPE_DIGITAL,
+    .OutputType = SAHPI_CTRL_LED,
+    .Default = SAHPI_CTRL_STATE_OFF,
+};
+const SimControlShapeT OperatingMode = {
+    .IdString = "Operating mode",
+    .Type = SAHPI_CTRL_TYPE_DISCRETE,
+    .OutputType = SAHPI_CTRL_GENERIC,
+    .Default = 1,
+};
+const SimControlShapeT DisplayBrightness = {
+    .IdString = "Display brightness",
+    .Type = SAHPI_CTRL_TYPE_ANALOG,
+    .OutputType = SAHPI_CTRL_GENERIC,
+    .Max = 100,
+    .Default = 75,
+};
+const SimControlShapeT BuzzerPattern = {
+    .IdString = "Buzzer pattern",
+    .Type = SAHPI_CTRL_TYPE_STREAM,
+    .OutputType = SAHPI_CTRL_AUDIBLE,
+    .Text = "\x01\x00",
+    .Length = 2,
+};
+const SimControlShapeT FrontPanel = {
+    .IdString = "Front panel display",
+    .Type = SAHPI_CTRL_TYPE_TEXT,
+    .OutputType = SAHPI_CTRL_LCD_DISPLAY,
+    .Text = "Kvi simulator   shelf ready",
+};
+const SimControlShapeT OemSettings = {
+    .IdString = "OEM settings",
+    .Type = SAHPI_CTRL_TYPE_OEM,
+    .OutputType = SAHPI_CTRL_OEM,
+    .Text = "\x01\x02\x03",
+    .Length = 3,
+};
+const SimControlShapeT HealthLed = {
+    .IdString = "Health LED",
+    .Type = SAHPI_CTRL_TYPE_DIGITAL,
+    .OutputType = SAHPI_CTRL_LED,
+    .Default = SAHPI_CTRL_STATE_ON,
+};
+const SimControlShapeT FanControl = {
+    .IdString = "Fan speed",
+    .Type = SAHPI_CTRL_TYPE_ANALOG,
+    .OutputType = SAHPI_CTRL_FAN_SPEED,
+    .Role = SIM_CTRL_FAN_SPEED,
+    .Min = 20,
+    .Max = 100,
+    .Default = 60,
+};
+const SimControlShapeT PowerInhibit = {
+    .IdString = "Power inhibit",
+    .Type = SAHPI_CTRL_TYPE_DIGITAL,
+    .OutputType = SAHPI_CTRL_POWER_SUPPLY_INHIBIT,
+    .Role = SIM_CTRL_POWER_INHIBIT,
+    .Default = SAHPI_CTRL_STATE_OFF,
+};
 
 const SimRecordShapeT ChassisRecords[] = {
     {SAHPI_SENSOR_RDR, &InletTemperature, SAHPI_FALSE},
@@ -137,12 +258,9 @@ const SimRecordShapeT ChassisRecords[] = {
 };
 
 const SimRecordShapeT BoardRecords[] = {
-    {SAHPI_SENSOR_RDR, &CpuTemperature, SAHPI_FALSE},
-    {SAHPI_SENSOR_RDR, &Board3V3, SAHPI_FALSE},
-    {SAHPI_SENSOR_RDR, &Board12V, SAHPI_FALSE},
-    {SAHPI_CTRL_RDR, &HealthLed, SAHPI_FALSE},
-    {SAHPI_INVENTORY_RDR, nullptr, SAHPI_FALSE},
-    {SAHPI_WATCHDOG_RDR, nullptr, SAHPI_FALSE},
+    {SAHPI_SENSOR_RDR, &CpuTemperature, SAHPI_FALSE}, {SAHPI_SENSOR_RDR, &Board3V3, SAHPI_FALSE},
+    {SAHPI_SENSOR_RDR, &Board12V, SAHPI_FALSE},       {SAHPI_CTRL_RDR, &HealthLed, SAHPI_FALSE},
+    {SAHPI_INVENTORY_RDR, nullptr, SAHPI_FALSE},      {SAHPI_WATCHDOG_RDR, nullptr, SAHPI_FALSE},
 };
 
 const SimRecordShapeT FanTrayRecords[] = {

@@ -6,7 +6,8 @@
 
 #include "SimModel.h"
 
-namespace {
+namespace
+{
 
 constexpr SaHpiUint32T INITIAL_COUNT_MS = 10000;
 
@@ -46,26 +47,32 @@ void defaults(SimWatchdogStateT &W) noexcept
     W.StoppedCount = INITIAL_COUNT_MS;
 }
 
-bool validUse(SaHpiWatchdogTimerUseT Use) noexcept
+bool validConfig(const SaHpiWatchdogT &W) noexcept
 {
-    return (Use >= SAHPI_WTU_NONE && Use <= SAHPI_WTU_OEM) || Use == SAHPI_WTU_UNSPECIFIED;
-}
-
-bool validInterrupt(SaHpiWatchdogPretimerInterruptT Interrupt) noexcept
-{
-    return (Interrupt >= SAHPI_WPI_NONE && Interrupt <= SAHPI_WPI_MESSAGE_INTERRUPT) ||
-           Interrupt == SAHPI_WPI_OEM;
+    SaHpiUint32T use = simRaw(W.TimerUse);
+    SaHpiUint32T action = simRaw(W.TimerAction);
+    SaHpiUint32T interrupt = simRaw(W.PretimerInterrupt);
+    return W.Log <= SAHPI_TRUE && W.Running <= SAHPI_TRUE &&
+           (use <= SAHPI_WTU_OEM || use == SAHPI_WTU_UNSPECIFIED) &&
+           action <= SAHPI_WA_POWER_CYCLE &&
+           (interrupt <= SAHPI_WPI_MESSAGE_INTERRUPT || interrupt == SAHPI_WPI_OEM);
 }
 
 SaHpiWatchdogExpFlagsT expirationFlag(SaHpiWatchdogTimerUseT Use) noexcept
 {
     switch (Use) {
-    case SAHPI_WTU_BIOS_FRB2: return SAHPI_WATCHDOG_EXP_BIOS_FRB2;
-    case SAHPI_WTU_BIOS_POST: return SAHPI_WATCHDOG_EXP_BIOS_POST;
-    case SAHPI_WTU_OS_LOAD: return SAHPI_WATCHDOG_EXP_OS_LOAD;
-    case SAHPI_WTU_SMS_OS: return SAHPI_WATCHDOG_EXP_SMS_OS;
-    case SAHPI_WTU_OEM: return SAHPI_WATCHDOG_EXP_OEM;
-    default: return 0;
+    case SAHPI_WTU_BIOS_FRB2:
+        return SAHPI_WATCHDOG_EXP_BIOS_FRB2;
+    case SAHPI_WTU_BIOS_POST:
+        return SAHPI_WATCHDOG_EXP_BIOS_POST;
+    case SAHPI_WTU_OS_LOAD:
+        return SAHPI_WATCHDOG_EXP_OS_LOAD;
+    case SAHPI_WTU_SMS_OS:
+        return SAHPI_WATCHDOG_EXP_SMS_OS;
+    case SAHPI_WTU_OEM:
+        return SAHPI_WATCHDOG_EXP_OEM;
+    default:
+        return 0;
     }
 }
 
@@ -213,9 +220,7 @@ SaErrorT simWatchdogTimerSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiWatchdogNumT
     if (record == nullptr || Watchdog == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    if (Watchdog->Log > 1 || Watchdog->Running > 1 || !validUse(Watchdog->TimerUse) ||
-        Watchdog->TimerAction < SAHPI_WA_NO_ACTION || Watchdog->TimerAction > SAHPI_WA_POWER_CYCLE ||
-        !validInterrupt(Watchdog->PretimerInterrupt)) {
+    if (!validConfig(*Watchdog)) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
     if (Watchdog->PreTimeoutInterval > Watchdog->InitialCount) {
@@ -229,7 +234,8 @@ SaErrorT simWatchdogTimerSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiWatchdogNumT
     SaHpiWatchdogExpFlagsT flags = w.Config.TimerUseExpFlags;
     w.Config = *Watchdog;
     // Expiration flags written as 1 are cleared; the others stay.
-    w.Config.TimerUseExpFlags = static_cast<SaHpiWatchdogExpFlagsT>(flags & ~Watchdog->TimerUseExpFlags);
+    w.Config.TimerUseExpFlags =
+        static_cast<SaHpiWatchdogExpFlagsT>(flags & ~Watchdog->TimerUseExpFlags);
     w.Config.Running = SAHPI_FALSE;
     w.Config.PresentCount = 0;
     // A running timer told to keep running restarts with the new count; a

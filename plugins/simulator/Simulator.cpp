@@ -10,7 +10,8 @@
 
 #include "SimModel.h"
 
-namespace {
+namespace
+{
 
 // Configuration keys of the simulator's own, with their defaults and bounds.
 struct SimSizeKeyT {
@@ -20,7 +21,14 @@ struct SimSizeKeyT {
     SaHpiUint32T Max;
 };
 
-enum { SIM_KEY_BOARDS, SIM_KEY_FAN_TRAYS, SIM_KEY_FANS, SIM_KEY_SUPPLIES, SIM_KEY_LOG_SIZE, SIM_KEY_COUNT };
+enum {
+    SIM_KEY_BOARDS,
+    SIM_KEY_FAN_TRAYS,
+    SIM_KEY_FANS,
+    SIM_KEY_SUPPLIES,
+    SIM_KEY_LOG_SIZE,
+    SIM_KEY_COUNT
+};
 
 // Fans are records of their tray, and a resource's record numbers are 8 bits
 // wide, so a tray keeps well below 255 records.
@@ -62,8 +70,7 @@ SaHpiUint32T readSize(const SimSizeKeyT &Key) noexcept
         return Key.Default;
     }
     if (rc != SA_OK || value < Key.Min || value > Key.Max) {
-        KVI_WLOG(KVI_LOG_WARN, "Simulator: invalid %s (rc=%d), using %u", Key.Key, rc,
-                 Key.Default);
+        KVI_WLOG(KVI_LOG_WARN, "Simulator: invalid %s (rc=%d), using %u", Key.Key, rc, Key.Default);
         return Key.Default;
     }
     return value;
@@ -339,8 +346,8 @@ SaErrorT registerResource(SaHpiDomainIdT DomainId, SimResourceT *Resource,
     pthread_mutex_unlock(&Registry);
 
     SaHpiResourceIdT rid = 0;
-    SaErrorT rc = kviCsRptEntryAdd(DomainId, entry, Resource, SAHPI_FALSE, &simRptFnTable,
-                                   MaplNum, Lock, &rid);
+    SaErrorT rc = kviCsRptEntryAdd(DomainId, entry, Resource, SAHPI_FALSE, &simRptFnTable, MaplNum,
+                                   Lock, &rid);
     if (rc != SA_OK) {
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Simulator: kviCsRptEntryAdd failed. rc=%d", rc);
         if (unregisterResource(Resource)) {
@@ -352,6 +359,13 @@ SaErrorT registerResource(SaHpiDomainIdT DomainId, SimResourceT *Resource,
         SimLock lock(Resource);
         Resource->ResourceId = rid;
     }
+    // The entry id of an RPT entry is its resource id, which the table gives
+    // out only now: rewrite the entry while it is still inactive.
+    rc = kviCsRptEntryModifyByRid(DomainId, rid, entry, nullptr);
+    if (rc != SA_OK) {
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Simulator: kviCsRptEntryModifyByRid failed. rc=%d, rid=%u",
+                 rc, rid);
+    }
 
     for (SaHpiUint32T i = 0; i < Resource->RecordCount && rc == SA_OK; i++) {
         SimRecordT *record = &Resource->Records[i];
@@ -361,8 +375,7 @@ SaErrorT registerResource(SaHpiDomainIdT DomainId, SimResourceT *Resource,
         KviCsRdrRecordNumT num;
         rc = kviCsRdrAdd(DomainId, rid, &rdr, record, &simRdrFnTable, &recordId, &num);
         if (rc != SA_OK) {
-            KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Simulator: kviCsRdrAdd failed. rc=%d, rid=%u", rc,
-                     rid);
+            KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Simulator: kviCsRdrAdd failed. rc=%d, rid=%u", rc, rid);
             break;
         }
         {
@@ -421,10 +434,10 @@ SaErrorT simMaplInitialization(SaHpiUint32T Num) noexcept
     for (SaHpiUint32T i = 0; i < SIM_KEY_COUNT; i++) {
         Sizes[i] = readSize(SizeKeys[i]);
     }
-    ResourceCapacity = 1 + Sizes[SIM_KEY_BOARDS] + Sizes[SIM_KEY_FAN_TRAYS] +
-                       Sizes[SIM_KEY_SUPPLIES];
-    Resources = static_cast<SimResourceT **>(
-        KVI_CS_MALLOC(ResourceCapacity * sizeof(SimResourceT *)));
+    ResourceCapacity =
+        1 + Sizes[SIM_KEY_BOARDS] + Sizes[SIM_KEY_FAN_TRAYS] + Sizes[SIM_KEY_SUPPLIES];
+    Resources =
+        static_cast<SimResourceT **>(KVI_CS_MALLOC(ResourceCapacity * sizeof(SimResourceT *)));
     if (Resources == nullptr) {
         pthread_mutex_unlock(&Registry);
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Simulator: out of memory");
@@ -481,8 +494,7 @@ SaErrorT simResourcesDiscover(SaHpiDomainIdT DomainId) noexcept
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Simulator: no plug-in lock available");
         return SA_ERR_HPI_ERROR;
     }
-    const SaHpiUint32T counts[SIM_KIND_COUNT] = {1, Sizes[SIM_KEY_BOARDS],
-                                                 Sizes[SIM_KEY_FAN_TRAYS],
+    const SaHpiUint32T counts[SIM_KIND_COUNT] = {1, Sizes[SIM_KEY_BOARDS], Sizes[SIM_KEY_FAN_TRAYS],
                                                  Sizes[SIM_KEY_SUPPLIES]};
     SaErrorT result = SA_OK;
     SaHpiUint32T added = 0;
@@ -512,8 +524,8 @@ SaErrorT simResourcesDiscover(SaHpiDomainIdT DomainId) noexcept
 
 // ---- Removal slots: the library calls them when it drops our entries ----
 
-SaErrorT simRdrResourcesRemove(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRdrT *,
-                                          void *UserData, KviDsRdrFnTable *) noexcept
+SaErrorT simRdrResourcesRemove(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRdrT *, void *UserData,
+                               KviDsRdrFnTable *) noexcept
 {
     auto *record = static_cast<SimRecordT *>(UserData);
     if (record == nullptr) {
@@ -527,9 +539,8 @@ SaErrorT simRdrResourcesRemove(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRdrT *,
     return SA_OK;
 }
 
-SaErrorT simRptEntryResourcesRemove(SaHpiDomainIdT, SaHpiResourceIdT,
-                                               SaHpiRptEntryT *, void *UserDefined, SaHpiBoolT,
-                                               KviDsRptFnTable *) noexcept
+SaErrorT simRptEntryResourcesRemove(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRptEntryT *,
+                                    void *UserDefined, SaHpiBoolT, KviDsRptFnTable *) noexcept
 {
     auto *resource = static_cast<SimResourceT *>(UserDefined);
     if (resource == nullptr) {
@@ -643,24 +654,12 @@ KviDsRptFnTable simRptFnTable = {
 };
 
 KviDsRdrFnTable simRdrFnTable = {
-    simSensorReadingGet,
-    simSensorReadingConvert,
-    simSensorThresholdsGet,
-    simSensorThresholdsSet,
-    simSensorEventEnablesGet,
-    simSensorEventEnablesSet,
-    simControlStateGet,
-    simControlStateSet,
-    simWatchdogTimerGet,
-    simWatchdogTimerSet,
-    simWatchdogTimerReset,
-    simEntityInventoryDataRead,
-    simEntityInventoryDataWrite,
-    simActiveAlarmTranslate,
-    simRdrResourcesRemove,
-    simRdrDefaultParmControl,
-    simRdrSaveParmControl,
-    simRdrRestoreParmControl,
+    simSensorReadingGet,         simSensorReadingConvert,  simSensorThresholdsGet,
+    simSensorThresholdsSet,      simSensorEventEnablesGet, simSensorEventEnablesSet,
+    simControlStateGet,          simControlStateSet,       simWatchdogTimerGet,
+    simWatchdogTimerSet,         simWatchdogTimerReset,    simEntityInventoryDataRead,
+    simEntityInventoryDataWrite, simActiveAlarmTranslate,  simRdrResourcesRemove,
+    simRdrDefaultParmControl,    simRdrSaveParmControl,    simRdrRestoreParmControl,
 };
 
 // The one symbol the plug-in manager looks up.
