@@ -16,10 +16,10 @@ constexpr KviRestoreTextsT CTRL_STATE_TEXTS = {
 // The record's own default for its type; false for a type HPI does not know.
 bool defaultState(const SaHpiCtrlRecT &Ctrl, SaHpiCtrlStateT *State) noexcept
 {
-    State->Type = Ctrl.Type;
+    memcpy(&State->Type, &Ctrl.Type, sizeof State->Type);
     SaHpiCtrlStateUnionT &state = State->StateUnion;
     const SaHpiCtrlRecUnionT &record = Ctrl.TypeUnion;
-    switch (Ctrl.Type) {
+    switch (kviCsRawEnum(Ctrl.Type)) {
     case SAHPI_CTRL_TYPE_DIGITAL:
         state.Digital = record.Digital.Default;
         return true;
@@ -91,9 +91,9 @@ KVI_EXPORT SaErrorT kviCsRdrSaveCtrlParmControl(SaHpiDomainIdT DomainId,
     const SaHpiCtrlRecT &ctrl = Rdr->RdrTypeUnion.CtrlRec;
     SaHpiCtrlStateT state;
     memset(&state, 0, sizeof state);
-    state.Type = ctrl.Type;
+    memcpy(&state.Type, &ctrl.Type, sizeof state.Type);
     // A text control is saved with all of its lines.
-    if (ctrl.Type == SAHPI_CTRL_TYPE_TEXT)
+    if (kviCsRawEnum(ctrl.Type) == SAHPI_CTRL_TYPE_TEXT)
         state.StateUnion.Text.Line = SAHPI_TLN_ALL_LINES;
     if (FnTable->ControlStateGet == nullptr) {
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "ControlStateGet is NULL.");

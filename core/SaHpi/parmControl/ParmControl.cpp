@@ -41,10 +41,12 @@ constexpr RdrActionTextsT RDR_ACTION_TEXTS[] = {
     {"RdrRestoreParmControl is NULL. Skipping RDR.", "RdrRestoreParmControl failed. rc %d"},
 };
 
-bool validAction(SaHpiParmActionT Action) noexcept
+// An action as a client sent it, before it is known to be one of the three.
+using RawActionT = std::underlying_type_t<SaHpiParmActionT>;
+
+bool validAction(RawActionT Action) noexcept
 {
-    int value = static_cast<int>(Action);
-    return value >= SAHPI_DEFAULT_PARM && value <= SAHPI_RESTORE_PARM;
+    return Action >= SAHPI_DEFAULT_PARM && Action <= SAHPI_RESTORE_PARM;
 }
 
 // Calls the resource's slot for Action; false when the slot is empty.
@@ -124,13 +126,14 @@ bool takesPart(SaHpiResourceIdT ResourceId, const SaHpiRdrT &Rdr) noexcept
 SaErrorT performOnRecord(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId, KviRdrVisitT *Record,
                          void *Context) noexcept
 {
-    SaHpiParmActionT action = *static_cast<const SaHpiParmActionT *>(Context);
+    RawActionT raw = *static_cast<const RawActionT *>(Context);
     if (!takesPart(ResourceId, Record->Rdr))
         return SA_OK;
-    if (!validAction(action)) {
+    if (!validAction(raw)) {
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid Parm Control Action");
         return SA_ERR_HPI_INVALID_PARAMS;
     }
+    auto action = static_cast<SaHpiParmActionT>(raw);
     const RdrActionTextsT &texts = RDR_ACTION_TEXTS[action];
     SaErrorT rc = SA_OK;
     if (!callRdrSlot(DomainId, ResourceId, action, Record, &rc))
@@ -288,7 +291,7 @@ SaErrorT saveEventEnables(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId, 
                           KviDsRdrFnTable *FnTable, void *UserData) noexcept
 {
     const SaHpiSensorRecT &sensor = Rdr->RdrTypeUnion.SensorRec;
-    if (sensor.EventCtrl == SAHPI_SEC_NO_EVENTS) {
+    if (kviCsRawEnum(sensor.EventCtrl) == SAHPI_SEC_NO_EVENTS) {
         KVI_DLOG(KVI_LOG_DBG_H, "Sensor does not support events. None Saved");
         return SA_OK;
     }
@@ -340,9 +343,9 @@ SaErrorT restoreEventEnables(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceI
                              void *UserData) noexcept
 {
     const SaHpiSensorRecT &sensor = Rdr->RdrTypeUnion.SensorRec;
-    if (sensor.EventCtrl == SAHPI_SEC_NO_EVENTS)
+    if (kviCsRawEnum(sensor.EventCtrl) == SAHPI_SEC_NO_EVENTS)
         return SA_OK;
-    KVI_DLOG(KVI_LOG_DBG_L, "Sensor supports events %d", sensor.EventCtrl);
+    KVI_DLOG(KVI_LOG_DBG_L, "Sensor supports events %d", kviCsRawEnum(sensor.EventCtrl));
     SaHpiSensorEvtEnablesT enables;
     bool found = false;
     SaErrorT rc = kviCsRestoreReadResult(
@@ -361,11 +364,11 @@ KVI_EXPORT SaErrorT kviCsParmControl(SaHpiDomainIdT DomainId, SaHpiResourceIdT R
                                      SaHpiParmActionT Action, KviDsRptFnTable *FnTable,
                                      void *UserDefined) noexcept
 {
-    KVI_TRACE("domain=%u, rid=%u, action=%d", DomainId, ResourceId, Action);
+    KVI_TRACE("domain=%u, rid=%u, action=%d", DomainId, ResourceId, kviCsRawEnum(Action));
     KVI_NULL_CHECK(FnTable);
     KVI_NULL_CHECK(UserDefined);
-    if (!validAction(Action)) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid Parm Action %d", Action);
+    if (!validAction(kviCsRawEnum(Action))) {
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid Parm Action %d", kviCsRawEnum(Action));
         return SA_ERR_HPI_INVALID_PARAMS;
     }
     const RptActionTextsT &texts = RPT_ACTION_TEXTS[Action];
@@ -429,8 +432,9 @@ KVI_EXPORT SaErrorT kviCsRptRestoreParmControl(SaHpiDomainIdT DomainId, SaHpiRes
 KVI_EXPORT SaErrorT kviCsRdrPerformParmAction(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                               SaHpiParmActionT Action) noexcept
 {
-    KVI_TRACE("domain=%u, rid=%u, action=%d", DomainId, ResourceId, Action);
-    return kviCsRdrWalk(DomainId, ResourceId, "Rdr is not active", performOnRecord, &Action);
+    KVI_TRACE("domain=%u, rid=%u, action=%d", DomainId, ResourceId, kviCsRawEnum(Action));
+    RawActionT action = kviCsRawEnum(Action);
+    return kviCsRdrWalk(DomainId, ResourceId, "Rdr is not active", performOnRecord, &action);
 }
 
 KVI_EXPORT SaErrorT kviCsRdrSaveSensorParmControl(SaHpiDomainIdT DomainId,

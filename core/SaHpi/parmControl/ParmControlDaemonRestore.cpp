@@ -29,7 +29,7 @@ SaErrorT restoreSensor(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "kviCsDeamonRestoreSensorThresh Failed. rc %d", rc);
         return SA_ERR_HPI_ERROR;
     }
-    if (sensor.EventCtrl != SAHPI_SEC_NO_EVENTS &&
+    if (kviCsRawEnum(sensor.EventCtrl) != SAHPI_SEC_NO_EVENTS &&
         (rc = kviCsDeamonRestoreEventEnables(DomainId, ResourceId, sensor.Num, &Record->Rdr,
                                              &Record->FnTable, Record->UserData)) != SA_OK) {
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "kviCsDeamonRestoreEventEnables Failed. rc %d", rc);

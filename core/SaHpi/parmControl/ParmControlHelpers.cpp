@@ -64,7 +64,7 @@ SaErrorT getWhole(const char *Key, SaHpiBoolT IsDaemonSave, SaHpiUint32T Length,
 
 SaHpiUint32T ctrlStateLength(const SaHpiCtrlStateT *CtrlState) noexcept
 {
-    if (CtrlState->Type == SAHPI_CTRL_TYPE_TEXT)
+    if (kviCsRawEnum(CtrlState->Type) == SAHPI_CTRL_TYPE_TEXT)
         return CtrlState->StateUnion.Text.Text.DataLength + TEXT_CTRL_EXTRA;
     return sizeof(SaHpiCtrlStateT);
 }
@@ -73,7 +73,7 @@ SaHpiUint32T ctrlStateLength(const SaHpiCtrlStateT *CtrlState) noexcept
 // length field was not stored it reads as 0.
 bool shortCtrlStateIsSound(const SaHpiCtrlStateT *CtrlState, SaHpiUint32T BytesRead) noexcept
 {
-    if (BytesRead < TEXT_CTRL_EXTRA || CtrlState->Type != SAHPI_CTRL_TYPE_TEXT)
+    if (BytesRead < TEXT_CTRL_EXTRA || kviCsRawEnum(CtrlState->Type) != SAHPI_CTRL_TYPE_TEXT)
         return false;
     return BytesRead < TEXT_CTRL_LENGTH_END || BytesRead == ctrlStateLength(CtrlState);
 }

@@ -200,7 +200,7 @@ TEST_F(ParmControlUnitTest, RecordsOtherThanSensorsControlsAndInventoriesAreIgno
     // An action out of range is met at the first record that takes part.
     Record sensor = thresholdSensor();
     SaHpiResourceIdT other = addResource({&sensor});
-    EXPECT_EQ(kviCsRdrPerformParmAction(DOM, other, static_cast<SaHpiParmActionT>(7)),
+    EXPECT_EQ(kviCsRdrPerformParmAction(DOM, other, static_cast<SaHpiParmActionT>(3)),
               SA_ERR_HPI_INVALID_PARAMS);
     EXPECT_TRUE(log.contains("Invalid Parm Control Action"));
 }
