@@ -48,8 +48,7 @@ typedef SaErrorT (*KviDsRptEntryResourcesRemove)(SaHpiDomainIdT DomainId,
                                                  SaHpiBoolT Active, KviDsRptFnTable *FnTable);
 typedef SaErrorT (*KviDsSaveRptParmCtrl)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                          KviDsRptFnTable *FnTable, void *UserDefined);
-typedef SaErrorT (*KviDsRestoreRptParmCtrl)(SaHpiDomainIdT DomainId,
-                                            SaHpiResourceIdT ResourceId,
+typedef SaErrorT (*KviDsRestoreRptParmCtrl)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                             KviDsRptFnTable *FnTable, void *UserDefined,
                                             SaHpiBoolT IsDaemonRestore);
 
@@ -121,8 +120,7 @@ struct __KviDsRptFnTable {
 
 typedef struct __KviDsRdrFnTable KviDsRdrFnTable;
 
-typedef SaErrorT (*KviDsActiveAlarmTranslate)(SaHpiDomainIdT DomainId,
-                                              SaHpiResourceIdT ResourceId,
+typedef SaErrorT (*KviDsActiveAlarmTranslate)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                               SaHpiSensorNumT SensorNum, void *UserData,
                                               SaHpiRdrT *Rdr, SaHpiRptEntryT *RptEntry,
                                               SaHpiEventT *Event);
@@ -133,8 +131,7 @@ typedef SaErrorT (*KviDsDefaultRdrParmCtrl)(SaHpiDomainIdT DomainId, SaHpiResour
                                             SaHpiRdrT *Rdr, KviDsRdrFnTable *FnTable,
                                             void *UserData);
 typedef SaErrorT (*KviDsSaveRdrParmCtrl)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                         SaHpiRdrT *Rdr, KviDsRdrFnTable *FnTable,
-                                         void *UserData);
+                                         SaHpiRdrT *Rdr, KviDsRdrFnTable *FnTable, void *UserData);
 typedef SaErrorT (*KviDsRestoreRdrParmCtrl)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                             SaHpiBoolT IsDaemonRestore, SaHpiRdrT *Rdr,
                                             KviDsRdrFnTable *FnTable, void *UserData);
@@ -156,8 +153,7 @@ struct __KviDsRdrFnTable {
                                     SaHpiSensorThresholdsT *SensorThresholds, void *UserData);
     SaErrorT (*SensorEventEnablesGet)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                       SaHpiSensorNumT SensorNum, void *UserData,
-                                      SaHpiCapabilitiesT Capabilities,
-                                      SaHpiEventCategoryT Category,
+                                      SaHpiCapabilitiesT Capabilities, SaHpiEventCategoryT Category,
                                       SaHpiSensorEvtEnablesT *Enables);
     SaErrorT (*SensorEventEnablesSet)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                       SaHpiSensorNumT SensorNum, SaHpiSensorEvtEnablesT *Enables,
@@ -179,9 +175,8 @@ struct __KviDsRdrFnTable {
                                    SaHpiWatchdogNumT WatchdogNum, void *UserData);
     /* 12-13: inventory */
     SaErrorT (*EntityInventoryDataRead)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                        SaHpiEirIdT EirId, SaHpiUint32T BufferSize,
-                                        void *UserData, SaHpiInventoryDataT *InventData,
-                                        SaHpiUint32T *ActualSize);
+                                        SaHpiEirIdT EirId, SaHpiUint32T BufferSize, void *UserData,
+                                        SaHpiInventoryDataT *InventData, SaHpiUint32T *ActualSize);
     SaErrorT (*EntityInventoryDataWrite)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                          SaHpiEirIdT EirId, SaHpiInventoryDataT *InventData,
                                          void *UserData);
@@ -202,8 +197,7 @@ struct __KviDsRdrFnTable {
  * hold the master lock for reading, as ResourcesDiscover does. */
 KVI_API SaErrorT kviDsMaplManagerGetMaplLock(SaHpiUint32T MaplNum, SaHpiUint32T LockNum,
                                              KviCsRwLockT **MaplLock) KVI_NOEXCEPT;
-KVI_API SaErrorT kviDsMaplManagerUnprotectedGetMaplLock(SaHpiUint32T MaplNum,
-                                                        SaHpiUint32T LockNum,
+KVI_API SaErrorT kviDsMaplManagerUnprotectedGetMaplLock(SaHpiUint32T MaplNum, SaHpiUint32T LockNum,
                                                         KviCsRwLockT **MaplLock) KVI_NOEXCEPT;
 
 /* Ready-made removal slots: they free UserDefined with the library's
@@ -214,8 +208,8 @@ KVI_API SaErrorT kviDsDefaultRptResourcesRemove(SaHpiDomainIdT DomainId,
                                                 SaHpiBoolT Active,
                                                 KviDsRptFnTable *FnTable) KVI_NOEXCEPT;
 KVI_API SaErrorT kviDsDefaultRdrResourcesRemove(SaHpiDomainIdT DomainId,
-                                                SaHpiResourceIdT ResourceId,
-                                                SaHpiRdrT *RdrEntry, void *UserDefined,
+                                                SaHpiResourceIdT ResourceId, SaHpiRdrT *RdrEntry,
+                                                void *UserDefined,
                                                 KviDsRdrFnTable *FnTable) KVI_NOEXCEPT;
 
 KVI_EXTERN_C_END

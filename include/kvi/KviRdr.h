@@ -50,9 +50,9 @@ KVI_API SaErrorT kviCsRdrHashSizeGet(SaHpiUint32T *HashSize) KVI_NOEXCEPT;
 
 KVI_API SaErrorT kviCsRdrRepositoryContainerInitialize(
     KviCsRdrRepositoryContainerT *RdrRepositoryContainer) KVI_NOEXCEPT;
-KVI_API SaErrorT kviCsRdrRepositoryRemove(
-    SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-    KviCsRdrRepositoryContainerT *RdrRepositoryContainer) KVI_NOEXCEPT;
+KVI_API SaErrorT kviCsRdrRepositoryRemove(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
+                                          KviCsRdrRepositoryContainerT *RdrRepositoryContainer)
+    KVI_NOEXCEPT;
 
 /* Adds a record to an inactive resource. The record's number and record id
  * are written into RdrEntry as well as into the outputs. */
@@ -79,8 +79,8 @@ KVI_API SaErrorT kviCsRdrGetControl(SaHpiDomainIdT DomainId, SaHpiResourceIdT Re
  * the resource's default record. */
 KVI_API SaErrorT kviCsRdrGetEir(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                 SaHpiEirIdT EirNum, SaHpiRdrT *Rdr, SaHpiBoolT *Active,
-                                void **UserDefined, KviDsRdrFnTable *FnTable,
-                                SaHpiUint32T *MaplNum, KviCsRwLockT **MaplLock) KVI_NOEXCEPT;
+                                void **UserDefined, KviDsRdrFnTable *FnTable, SaHpiUint32T *MaplNum,
+                                KviCsRwLockT **MaplLock) KVI_NOEXCEPT;
 KVI_API SaErrorT kviCsRdrGetWatchdog(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                      SaHpiWatchdogNumT WatchdogNum, SaHpiRdrT *Rdr,
                                      SaHpiBoolT *Active, void **UserDefined,

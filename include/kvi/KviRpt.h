@@ -61,8 +61,7 @@ KVI_API SaErrorT kviCsRptActiveEntryGet(SaHpiDomainIdT DomainId, SaHpiEntryIdT E
 KVI_API SaErrorT kviCsRptEntryGetByRid(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                        SaHpiRptEntryT *RptEntry, SaHpiBoolT *Active,
                                        void **UserDefined) KVI_NOEXCEPT;
-KVI_API SaErrorT kviCsRptActiveEntryGetByRid(SaHpiDomainIdT DomainId,
-                                             SaHpiResourceIdT ResourceId,
+KVI_API SaErrorT kviCsRptActiveEntryGetByRid(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                              SaHpiRptEntryT *RptEntry, KviDsRptFnTable *FnTable,
                                              void **UserDefined, SaHpiUint32T *MaplNum,
                                              KviCsRwLockT **MaplLock) KVI_NOEXCEPT;
@@ -76,15 +75,13 @@ KVI_API SaErrorT kviCsRptEntryModifyByRid(SaHpiDomainIdT DomainId, SaHpiResource
 KVI_API SaErrorT kviCsRptEntryActiveStateSetByRid(SaHpiDomainIdT DomainId,
                                                   SaHpiResourceIdT ResourceId,
                                                   SaHpiBoolT Active) KVI_NOEXCEPT;
-KVI_API SaErrorT kviCsRptEntryModifyTagByRid(SaHpiDomainIdT DomainId,
-                                             SaHpiResourceIdT ResourceId,
+KVI_API SaErrorT kviCsRptEntryModifyTagByRid(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                              SaHpiTextBufferT *Tag) KVI_NOEXCEPT;
 KVI_API SaErrorT kviCsRptEntryModifySeverityByRid(SaHpiDomainIdT DomainId,
                                                   SaHpiResourceIdT ResourceId,
                                                   SaHpiSeverityT Severity) KVI_NOEXCEPT;
 KVI_API SaErrorT kviCsRptEntryUserPointerSetByRid(SaHpiDomainIdT DomainId,
-                                                  SaHpiResourceIdT ResourceId,
-                                                  void *UserDefined,
+                                                  SaHpiResourceIdT ResourceId, void *UserDefined,
                                                   void **OldPointer) KVI_NOEXCEPT;
 KVI_API SaErrorT kviCsRptEntryUserPointerGetByRid(SaHpiDomainIdT DomainId,
                                                   SaHpiResourceIdT ResourceId,
@@ -109,9 +106,9 @@ KVI_API SaErrorT kviCsRptGetNode(KviCsRptContainerT *RptContainer, SaHpiResource
 KVI_API SaErrorT kviCsRptGetNodeFromLinkedList(KviCsLinkedListT *ListIn,
                                                SaHpiResourceIdT ResourceId,
                                                KviCsLinkedListNodeT **Node) KVI_NOEXCEPT;
-KVI_API SaErrorT kviCsRptGetRptEntryContainer(
-    KviCsRptContainerT *RptContainer, SaHpiResourceIdT ResourceId,
-    KviCsRptEntryContainerT **RptEntryContainer) KVI_NOEXCEPT;
+KVI_API SaErrorT
+kviCsRptGetRptEntryContainer(KviCsRptContainerT *RptContainer, SaHpiResourceIdT ResourceId,
+                             KviCsRptEntryContainerT **RptEntryContainer) KVI_NOEXCEPT;
 KVI_API SaErrorT kviCsRptEntryRemoveByRidNoLock(SaHpiDomainIdT DomainId,
                                                 SaHpiResourceIdT ResourceId,
                                                 KviCsRptContainerT *RptContainer) KVI_NOEXCEPT;

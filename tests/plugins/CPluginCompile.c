@@ -237,8 +237,7 @@ static SaErrorT sensorThresholdsSet(SaHpiDomainIdT DomainId, SaHpiResourceIdT Re
 
 static SaErrorT sensorEventEnablesGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                       SaHpiSensorNumT SensorNum, void *UserData,
-                                      SaHpiCapabilitiesT Capabilities,
-                                      SaHpiEventCategoryT Category,
+                                      SaHpiCapabilitiesT Capabilities, SaHpiEventCategoryT Category,
                                       SaHpiSensorEvtEnablesT *Enables)
 {
     return SA_ERR_HPI_INVALID_CMD;
@@ -285,9 +284,8 @@ static SaErrorT watchdogTimerReset(SaHpiDomainIdT DomainId, SaHpiResourceIdT Res
 }
 
 static SaErrorT entityInventoryDataRead(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                        SaHpiEirIdT EirId, SaHpiUint32T BufferSize,
-                                        void *UserData, SaHpiInventoryDataT *InventData,
-                                        SaHpiUint32T *ActualSize)
+                                        SaHpiEirIdT EirId, SaHpiUint32T BufferSize, void *UserData,
+                                        SaHpiInventoryDataT *InventData, SaHpiUint32T *ActualSize)
 {
     return SA_ERR_HPI_INVALID_CMD;
 }
@@ -325,6 +323,8 @@ static SaErrorT rdrRestoreParmControl(SaHpiDomainIdT DomainId, SaHpiResourceIdT 
     return SA_OK;
 }
 
+/* One slot a line, in the contract's order. */
+/* clang-format off */
 static KviDsRdrFnTable rdrTable = {
     sensorReadingGet,
     sensorReadingConvert,
@@ -345,6 +345,7 @@ static KviDsRdrFnTable rdrTable = {
     rdrSaveParmControl,
     rdrRestoreParmControl,
 };
+/* clang-format on */
 
 /* ---- Initialisation table ---- */
 
@@ -403,8 +404,8 @@ static SaErrorT resourcesDiscover(SaHpiDomainIdT DomainId)
     entry.ResourceTag.DataLength = (SaHpiUint8T)strlen(C_PLUGIN_TAG);
     memcpy(entry.ResourceTag.Data, C_PLUGIN_TAG, strlen(C_PLUGIN_TAG));
     void *user = KVI_CS_MALLOC(sizeof(SaHpiUint32T));
-    rc = kviCsRptEntryAdd(DomainId, entry, user, SAHPI_FALSE, &rptTable, maplNum, lock,
-                          &resourceId);
+    rc =
+        kviCsRptEntryAdd(DomainId, entry, user, SAHPI_FALSE, &rptTable, maplNum, lock, &resourceId);
     if (rc != SA_OK) {
         KVI_CS_FREE(user);
         resourceId = 0;

@@ -61,16 +61,16 @@ TEST(CPluginCompileTest, RegistersAResourceWithRecordsThroughTheCInterface)
     SaHpiEntryIdT next = 0;
     ASSERT_EQ(kviCsRptActiveEntryGet(0, SAHPI_FIRST_ENTRY, &next, &entry, nullptr), SA_OK);
     EXPECT_EQ(next, SAHPI_LAST_ENTRY) << "a second discovery adds nothing";
-    EXPECT_EQ(std::string(reinterpret_cast<char *>(entry.ResourceTag.Data),
-                          entry.ResourceTag.DataLength),
-              "C plug-in");
+    EXPECT_EQ(
+        std::string(reinterpret_cast<char *>(entry.ResourceTag.Data), entry.ResourceTag.DataLength),
+        "C plug-in");
     KviDsRptFnTable rptTable{};
     SaHpiUint32T mapl = 99;
     KviCsRwLockT *lock = nullptr;
     KviCsRwLockT *lockZero = nullptr;
-    ASSERT_EQ(kviCsRptActiveEntryGetByRid(0, entry.ResourceId, nullptr, &rptTable, nullptr, &mapl,
-                                          &lock),
-              SA_OK);
+    ASSERT_EQ(
+        kviCsRptActiveEntryGetByRid(0, entry.ResourceId, nullptr, &rptTable, nullptr, &mapl, &lock),
+        SA_OK);
     ASSERT_EQ(kviDsMaplManagerUnprotectedGetMaplLock(mapl, 0, &lockZero), SA_OK);
     EXPECT_EQ(lock, lockZero);
     EXPECT_EQ(filledSlots(rptTable), 26);
@@ -87,8 +87,8 @@ TEST(CPluginCompileTest, RegistersAResourceWithRecordsThroughTheCInterface)
     EXPECT_EQ(rdr.RecordId, 3u) << "the plug-in made its inventory record the default";
     EXPECT_TRUE(active);
     EXPECT_EQ(filledSlots(rdrTable), 18);
-    EXPECT_EQ(kviCsRdrGetWatchdog(0, entry.ResourceId, 4, &rdr, &active, nullptr, nullptr,
-                                  nullptr, nullptr),
+    EXPECT_EQ(kviCsRdrGetWatchdog(0, entry.ResourceId, 4, &rdr, &active, nullptr, nullptr, nullptr,
+                                  nullptr),
               SA_OK);
 
     // Unloading removes the resource; the library's default removal slots

@@ -17,23 +17,24 @@ KviCsSemaphore GlobalHashSizeSemaphore;
 SaHpiBoolT GlobalHashSizeSemaphoreInitialized = SAHPI_FALSE;
 SaHpiBoolT RdrInitialized = SAHPI_FALSE;
 
-#define KVI_SITE_LOG(Site, LevelNum, ...)                                                         \
-    kviCsLogger((Site).file, static_cast<SaHpiInt16T>((Site).line), (Site).func, (LevelNum),      \
+#define KVI_SITE_LOG(Site, LevelNum, ...)                                                          \
+    kviCsLogger((Site).file, static_cast<SaHpiInt16T>((Site).line), (Site).func, (LevelNum),       \
                 __VA_ARGS__)
 
-#define RDR_INIT_CHECK()                                                                          \
-    do {                                                                                          \
-        if (!RdrInitialized) {                                                                    \
-            KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Rdr not yet initialized");                            \
-            return SA_ERR_HPI_INVALID_REQUEST;                                                    \
-        }                                                                                         \
+#define RDR_INIT_CHECK()                                                                           \
+    do {                                                                                           \
+        if (!RdrInitialized) {                                                                     \
+            KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Rdr not yet initialized");                             \
+            return SA_ERR_HPI_INVALID_REQUEST;                                                     \
+        }                                                                                          \
     } while (0)
 
 // Runs Op with the hash-size semaphore held.
 template <typename Op> SaErrorT withGlobalHashSize(Op op)
 {
     if (!GlobalHashSizeSemaphoreInitialized) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "The RDR GlobalHashSizeSemaphore has not been initialized. ");
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL,
+                 "The RDR GlobalHashSizeSemaphore has not been initialized. ");
         return SA_ERR_HPI_INVALID_REQUEST;
     }
     SaErrorT rc = KVI_CS_SEM_WAIT(&GlobalHashSizeSemaphore, HASH_SIZE_TIMEOUT);
@@ -59,8 +60,8 @@ enum class MissingResource { NotPresent, InvalidResource };
 class RdrResourceScope
 {
   public:
-    RdrResourceScope(const KviCallSite &Site, SaHpiDomainIdT DomainId,
-                     SaHpiResourceIdT ResourceId, MissingResource Missing) noexcept
+    RdrResourceScope(const KviCallSite &Site, SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
+                     MissingResource Missing) noexcept
         : lock_(DomainId)
     {
         rc_ = lock_.held() ? find(Site, ResourceId, Missing) : lockFailure(Site, lock_.result());
@@ -110,9 +111,9 @@ class RdrResourceScope
     SaErrorT rc_;
 };
 
-#define LOCK_RDR_RESOURCE(Scope, DomainId, ResourceId, Missing)                                   \
-    RdrResourceScope Scope(KVI_CALL_SITE(""), (DomainId), (ResourceId), (Missing));               \
-    if (Scope.result() != SA_OK)                                                                  \
+#define LOCK_RDR_RESOURCE(Scope, DomainId, ResourceId, Missing)                                    \
+    RdrResourceScope Scope(KVI_CALL_SITE(""), (DomainId), (ResourceId), (Missing));                \
+    if (Scope.result() != SA_OK)                                                                   \
     return Scope.result()
 
 // Record ids are the entry ids clients hold on to; a repeated one would route
@@ -128,7 +129,7 @@ SaHpiEntryIdT takeRecordId(KviCsRdrRepositoryContainerT *Repository)
     return id;
 }
 
-bool isAddableRdrType(SaHpiRdrTypeT RdrType)
+bool isAddableRdrType(SaHpiUint32T RdrType)
 {
     return RdrType == SAHPI_CTRL_RDR || RdrType == SAHPI_SENSOR_RDR ||
            RdrType == SAHPI_INVENTORY_RDR || RdrType == SAHPI_WATCHDOG_RDR;
@@ -139,7 +140,7 @@ bool isAddableRdrType(SaHpiRdrTypeT RdrType)
 void numberRecord(SaHpiRdrT *Rdr, SaHpiEntryIdT RecordId, KviCsRdrRecordNumT *RecordNum)
 {
     auto number = static_cast<SaHpiUint8T>(RecordId & 0xFF);
-    switch (Rdr->RdrType) {
+    switch (kviRawEnum(Rdr->RdrType)) {
     case SAHPI_CTRL_RDR:
         Rdr->RdrTypeUnion.CtrlRec.Num = RecordNum->ControlNum = number;
         break;
@@ -200,7 +201,7 @@ bool supports(SaHpiCapabilitiesT Capabilities, SaHpiCapabilitiesT Needed, const 
 }
 
 // A resource is only asked for records of a kind it declares.
-bool hasRdrTypeCapablity(SaHpiCapabilitiesT Capabilities, SaHpiRdrTypeT RdrType)
+bool hasRdrTypeCapablity(SaHpiCapabilitiesT Capabilities, SaHpiUint32T RdrType)
 {
     switch (RdrType) {
     case SAHPI_NO_RECORD:
@@ -222,9 +223,9 @@ bool hasRdrTypeCapablity(SaHpiCapabilitiesT Capabilities, SaHpiRdrTypeT RdrType)
     }
 }
 
-bool isCorrectRdrType(const SaHpiRdrT &Rdr, SaHpiRdrTypeT RdrType)
+bool isCorrectRdrType(const SaHpiRdrT &Rdr, SaHpiUint32T RdrType)
 {
-    if (RdrType == SAHPI_NO_RECORD || Rdr.RdrType == RdrType)
+    if (RdrType == SAHPI_NO_RECORD || kviRawEnum(Rdr.RdrType) == RdrType)
         return true;
     KVI_DLOG(KVI_LOG_DBG_H, "RDR entry type (%d) does not match requested type (%d)", Rdr.RdrType,
              RdrType);
@@ -234,7 +235,7 @@ bool isCorrectRdrType(const SaHpiRdrT &Rdr, SaHpiRdrTypeT RdrType)
 // The record a client names by entry id (SAHPI_FIRST_ENTRY: the first of the
 // walk), if it is of the requested type.
 SaErrorT findTypedRecord(KviCsRdrRepositoryContainerT *Repository, SaHpiEntryIdT EntryId,
-                         SaHpiRdrTypeT RdrType, KviCsRdrContainerT **Record)
+                         SaHpiUint32T RdrType, KviCsRdrContainerT **Record)
 {
     SaHpiEntryIdT id = EntryId;
     if (id == SAHPI_FIRST_ENTRY && kviCsRdrGetNextEntry(Repository, id, &id) != SA_OK) {
@@ -327,7 +328,8 @@ KVI_EXPORT SaErrorT kviCsRdrInitializeGlobalHashSizeSemaphore(void) noexcept
     if (GlobalHashSizeSemaphoreInitialized)
         return SA_OK;
     if (KVI_CS_SEM_INIT(&GlobalHashSizeSemaphore, 1) != SA_OK) {
-        KVI_ELOG(KVI_LOG_ERR_FATAL, "Unable to initialize the RDR GlobalHashSizeSemaphore.  Bailing");
+        KVI_ELOG(KVI_LOG_ERR_FATAL,
+                 "Unable to initialize the RDR GlobalHashSizeSemaphore.  Bailing");
         exit(1);
     }
     GlobalHashSizeSemaphoreInitialized = SAHPI_TRUE;
@@ -367,8 +369,8 @@ KVI_EXPORT SaErrorT kviCsRdrHashSizeGet(SaHpiUint32T *HashSize) noexcept
     return withGlobalHashSize([HashSize] { *HashSize = GlobalHashSize; });
 }
 
-KVI_EXPORT SaErrorT kviCsRdrRepositoryContainerInitialize(
-    KviCsRdrRepositoryContainerT *RdrRepositoryContainer) noexcept
+KVI_EXPORT SaErrorT
+kviCsRdrRepositoryContainerInitialize(KviCsRdrRepositoryContainerT *RdrRepositoryContainer) noexcept
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(RdrRepositoryContainer);
@@ -388,9 +390,9 @@ KVI_EXPORT SaErrorT kviCsRdrRepositoryContainerInitialize(
     return allocateLists(size, &RdrRepositoryContainer->RdrList);
 }
 
-KVI_EXPORT SaErrorT kviCsRdrRepositoryRemove(
-    SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-    KviCsRdrRepositoryContainerT *RdrRepositoryContainer) noexcept
+KVI_EXPORT SaErrorT
+kviCsRdrRepositoryRemove(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
+                         KviCsRdrRepositoryContainerT *RdrRepositoryContainer) noexcept
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(RdrRepositoryContainer);
@@ -427,8 +429,8 @@ KVI_EXPORT SaErrorT kviCsRdrAdd(SaHpiDomainIdT DomainId, SaHpiResourceIdT Resour
     }
     // The id is spent from here on, whatever happens to the record.
     SaHpiEntryIdT id = takeRecordId(scope.repository());
-    if (!isAddableRdrType(RdrEntry->RdrType)) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "RdrType is invalid (%d)", RdrEntry->RdrType);
+    if (!isAddableRdrType(kviRawEnum(RdrEntry->RdrType))) {
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "RdrType is invalid (%d)", kviRawEnum(RdrEntry->RdrType));
         return SA_ERR_HPI_INVALID_PARAMS;
     }
     numberRecord(RdrEntry, id, RecordNum);
@@ -442,18 +444,20 @@ KVI_EXPORT SaErrorT kviCsRdrAdd(SaHpiDomainIdT DomainId, SaHpiResourceIdT Resour
 KVI_EXPORT SaErrorT kviCsRdrGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                 SaHpiRdrTypeT RdrType, SaHpiEntryIdT EntryId,
                                 SaHpiEntryIdT *NextEntryId, SaHpiRdrT *Rdr, SaHpiBoolT *Active,
-                                void **UserDefined, KviDsRdrFnTable *FnTable,
-                                SaHpiUint32T *MaplNum, KviCsRwLockT **MaplLock) noexcept
+                                void **UserDefined, KviDsRdrFnTable *FnTable, SaHpiUint32T *MaplNum,
+                                KviCsRwLockT **MaplLock) noexcept
 {
     KVI_TRACE("");
     RDR_INIT_CHECK();
     KVI_NULL_CHECK(Active);
     LOCK_RDR_RESOURCE(scope, DomainId, ResourceId, MissingResource::InvalidResource);
     const KviCsRptEntryContainerT *entry = scope.entry();
-    if (!hasRdrTypeCapablity(entry->RptEntry.ResourceCapabilities, RdrType))
+    // A C caller may pass any int as the type.
+    SaHpiUint32T type = kviRawEnum(RdrType);
+    if (!hasRdrTypeCapablity(entry->RptEntry.ResourceCapabilities, type))
         return SA_ERR_HPI_INVALID_CMD;
     KviCsRdrContainerT *record = nullptr;
-    SaErrorT rc = findTypedRecord(scope.repository(), EntryId, RdrType, &record);
+    SaErrorT rc = findTypedRecord(scope.repository(), EntryId, type, &record);
     if (rc != SA_OK)
         return rc;
     // The next id is that of the next record of any type.
@@ -475,10 +479,9 @@ KVI_EXPORT SaErrorT kviCsRdrGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT Resour
 }
 
 KVI_EXPORT SaErrorT kviCsRdrGetSensor(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                      SaHpiSensorNumT SensorNum, SaHpiRdrT *Rdr,
-                                      SaHpiBoolT *Active, void **UserDefined,
-                                      KviDsRdrFnTable *FnTable, SaHpiUint32T *MaplNum,
-                                      KviCsRwLockT **MaplLock) noexcept
+                                      SaHpiSensorNumT SensorNum, SaHpiRdrT *Rdr, SaHpiBoolT *Active,
+                                      void **UserDefined, KviDsRdrFnTable *FnTable,
+                                      SaHpiUint32T *MaplNum, KviCsRwLockT **MaplLock) noexcept
 {
     KVI_TRACE("");
     return kviCsRdrGet(DomainId, ResourceId, SAHPI_SENSOR_RDR, SensorNum, nullptr, Rdr, Active,
@@ -518,8 +521,8 @@ KVI_EXPORT SaErrorT kviCsRdrGetWatchdog(SaHpiDomainIdT DomainId, SaHpiResourceId
     SaErrorT rc = resolveDefault(DomainId, ResourceId, &WatchdogNum, kviCsDefaultWatchdogGet);
     if (rc != SA_OK)
         return rc;
-    return kviCsRdrGet(DomainId, ResourceId, SAHPI_WATCHDOG_RDR, WatchdogNum, nullptr, Rdr,
-                       Active, UserDefined, FnTable, MaplNum, MaplLock);
+    return kviCsRdrGet(DomainId, ResourceId, SAHPI_WATCHDOG_RDR, WatchdogNum, nullptr, Rdr, Active,
+                       UserDefined, FnTable, MaplNum, MaplLock);
 }
 
 KVI_EXPORT SaErrorT kviCsDefaultEirSet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,

@@ -9,8 +9,8 @@
 namespace
 {
 // Logs at the position of the operation that a shared frame works for.
-#define KVI_SITE_LOG(Site, LevelNum, ...)                                                         \
-    kviCsLogger((Site).file, static_cast<SaHpiInt16T>((Site).line), (Site).func, (LevelNum),      \
+#define KVI_SITE_LOG(Site, LevelNum, ...)                                                          \
+    kviCsLogger((Site).file, static_cast<SaHpiInt16T>((Site).line), (Site).func, (LevelNum),       \
                 __VA_ARGS__)
 
 // Ids that no by-id change accepts. SAHPI_DOMAIN_CONTROLLER_ID is among them
@@ -21,13 +21,13 @@ bool isReservedId(SaHpiResourceIdT ResourceId)
            ResourceId == SAHPI_UNSPECIFIED_RESOURCE_ID || ResourceId == SAHPI_DOMAIN_CONTROLLER_ID;
 }
 
-#define CHECK_RESOURCE_ID(ResourceId)                                                             \
-    do {                                                                                          \
-        if (isReservedId(ResourceId)) {                                                           \
-            KVI_DLOG(KVI_LOG_DBG_H, "Cannot use SAHPI_FIRST_ENTRY or SAHPI_LAST_ENTRY or "        \
-                                    "SAHPI_UNSPECIFIED_RESOURCE_ID for Modify");                  \
-            return SA_ERR_HPI_INVALID_RESOURCE;                                                   \
-        }                                                                                         \
+#define CHECK_RESOURCE_ID(ResourceId)                                                              \
+    do {                                                                                           \
+        if (isReservedId(ResourceId)) {                                                            \
+            KVI_DLOG(KVI_LOG_DBG_H, "Cannot use SAHPI_FIRST_ENTRY or SAHPI_LAST_ENTRY or "         \
+                                    "SAHPI_UNSPECIFIED_RESOURCE_ID for Modify");                   \
+            return SA_ERR_HPI_INVALID_RESOURCE;                                                    \
+        }                                                                                          \
     } while (0)
 
 // The caller's result for a lock of the table that did not come.
@@ -42,9 +42,9 @@ SaErrorT lockRptFailure(const KviCallSite &Site, SaErrorT Rc)
 }
 
 // Holds the table's lock for the rest of the scope, or returns the failure.
-#define LOCK_RPT(Lock, DomainId)                                                                  \
-    KviRptLock Lock(DomainId);                                                                    \
-    if (!Lock.held())                                                                             \
+#define LOCK_RPT(Lock, DomainId)                                                                   \
+    KviRptLock Lock(DomainId);                                                                     \
+    if (!Lock.held())                                                                              \
     return lockRptFailure(KVI_CALL_SITE(""), Lock.result())
 
 // An unknown id is passed on as it is; anything else is a broken table.
@@ -63,7 +63,7 @@ SaErrorT getRptEntryContainer(const KviCallSite &Site, KviCsRptContainerT *Rpt,
                : SA_ERR_HPI_ERROR;
 }
 
-#define GET_RPT_ENTRY_CONTAINER(Rpt, ResourceId, Entry)                                           \
+#define GET_RPT_ENTRY_CONTAINER(Rpt, ResourceId, Entry)                                            \
     getRptEntryContainer(KVI_CALL_SITE(""), (Rpt), (ResourceId), (Entry))
 
 // The frame of the by-id operations: the table locked and one entry found
@@ -90,20 +90,21 @@ class RptEntryScope
     SaErrorT rc_;
 };
 
-#define LOCK_RPT_ENTRY(Scope, DomainId, ResourceId)                                               \
-    RptEntryScope Scope(KVI_CALL_SITE(""), (DomainId), (ResourceId));                             \
-    if (Scope.result() != SA_OK)                                                                  \
+#define LOCK_RPT_ENTRY(Scope, DomainId, ResourceId)                                                \
+    RptEntryScope Scope(KVI_CALL_SITE(""), (DomainId), (ResourceId));                              \
+    if (Scope.result() != SA_OK)                                                                   \
     return Scope.result()
 
 // The settings of an entry that are kept across a restart of the daemon.
 enum class NvSetting { Tag, Severity };
 
-// The one place the tag and severity will be written to the non-volatile
-// store, with the RPT lock still held. The store's save helpers
-// (kviCsSaveResTagNV, kviCsSaveResSeverityNV, flag SAHPI_TRUE) are not in the
-// library yet; until they are, nothing is saved and the change stands.
-SaErrorT saveToNonVolatile(NvSetting Setting, SaHpiDomainIdT DomainId,
-                           SaHpiResourceIdT ResourceId, const SaHpiRptEntryT &Entry)
+// The one place the tag and severity are to be written to the non-volatile
+// store, with the RPT lock still held: kviCsSaveResTagNV or
+// kviCsSaveResSeverityNV with the daemon flag SAHPI_TRUE. The saves are wired
+// in together with the parameter-control store; until then nothing is saved
+// and the change stands.
+SaErrorT saveToNonVolatile(NvSetting Setting, SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
+                           const SaHpiRptEntryT &Entry)
 {
     (void)Setting;
     (void)DomainId;
@@ -135,8 +136,26 @@ void copyOut(const KviCsRptEntryContainerT *Entry, SaHpiRptEntryT *RptEntry, voi
         *UserDefined = Entry->UserDefined;
 }
 
-// Takes a filled container into the table under its resource id. On failure
-// nothing of it is left behind.
+// Files a new entry's node in the list of its resource id, with an empty
+// record repository. On failure nothing of the entry is left behind.
+SaErrorT fileEntryNode(SaHpiDomainIdT DomainId, KviCsRptContainerT *Rpt, KviCsLinkedListNodeT *Node)
+{
+    auto *entry = static_cast<KviCsRptEntryContainerT *>(Node->Data);
+    SaHpiResourceIdT id = entry->RptEntry.ResourceId;
+    SaErrorT rc = kviCsRdrRepositoryContainerInitialize(&entry->RdrRepositoryContainer);
+    if (rc != SA_OK) {
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "kviCsRdrRepositoryContainerInitialize Returned %d", rc);
+        return SA_ERR_HPI_ERROR;
+    }
+    if (kviCsLinkedListAddToTail(&Rpt->RptEntryList[id % Rpt->HashSize], Node) != SA_OK) {
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Unable to add node to tail");
+        kviCsRdrRepositoryRemove(DomainId, id, &entry->RdrRepositoryContainer);
+        return SA_ERR_HPI_ERROR;
+    }
+    return SA_OK;
+}
+
+// Takes a filled container into the table under its resource id.
 SaErrorT fileNewEntry(SaHpiDomainIdT DomainId, KviCsRptContainerT *Rpt,
                       const KviCsRptEntryContainerT &Fill)
 {
@@ -154,20 +173,13 @@ SaErrorT fileNewEntry(SaHpiDomainIdT DomainId, KviCsRptContainerT *Rpt,
         return SA_ERR_HPI_OUT_OF_SPACE;
     }
     *entry = Fill;
-    rc = kviCsRdrRepositoryContainerInitialize(&entry->RdrRepositoryContainer);
-    SaHpiResourceIdT id = Fill.RptEntry.ResourceId;
     node->Data = entry;
-    if (rc != SA_OK)
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "kviCsRdrRepositoryContainerInitialize Returned %d", rc);
-    else if (kviCsLinkedListAddToTail(&Rpt->RptEntryList[id % Rpt->HashSize], node) == SA_OK)
-        return SA_OK;
-    else {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Unable to add node to tail");
-        kviCsRdrRepositoryRemove(DomainId, id, &entry->RdrRepositoryContainer);
+    rc = fileEntryNode(DomainId, Rpt, node);
+    if (rc != SA_OK) {
+        KVI_CS_FREE(entry);
+        kviCsLinkedListNodeFree(node);
     }
-    KVI_CS_FREE(entry);
-    kviCsLinkedListNodeFree(node);
-    return SA_ERR_HPI_ERROR;
+    return rc;
 }
 
 using KviRptEntryMatch = bool (*)(const KviCsRptEntryContainerT *Entry, const void *Owner);
@@ -222,12 +234,14 @@ SaErrorT removeOwnedEntries(const KviCallSite &Site, SaHpiDomainIdT DomainId,
 
 bool validTag(const SaHpiTextBufferT *Tag)
 {
-    if (static_cast<SaHpiUint32T>(Tag->DataType) > SAHPI_TL_TYPE_LANGUAGE) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid value (%d) in Tag.DataType.", Tag->DataType);
+    SaHpiUint32T dataType = kviRawEnum(Tag->DataType);
+    SaHpiUint32T language = kviRawEnum(Tag->Language);
+    if (dataType > SAHPI_TL_TYPE_LANGUAGE) {
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid value (%d) in Tag.DataType.", dataType);
         return false;
     }
-    if (static_cast<SaHpiUint32T>(Tag->Language) > SAHPI_LANG_ZULU) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid value (%d) in Tag.Language.", Tag->Language);
+    if (language > SAHPI_LANG_ZULU) {
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid value (%d) in Tag.Language.", language);
         return false;
     }
     return true;
@@ -235,7 +249,7 @@ bool validTag(const SaHpiTextBufferT *Tag)
 
 bool validSeverity(SaHpiSeverityT Severity)
 {
-    auto value = static_cast<SaHpiUint32T>(Severity);
+    SaHpiUint32T value = kviRawEnum(Severity);
     return value <= SAHPI_OK || value == SAHPI_DEBUG;
 }
 } // namespace
@@ -257,9 +271,9 @@ KVI_EXPORT SaErrorT kviCsRptGetRptContainer(SaHpiDomainIdT DomainId,
 }
 
 KVI_EXPORT SaErrorT kviCsRptEntryAdd(SaHpiDomainIdT DomainId, SaHpiRptEntryT RptEntry,
-                                     void *UserDefined, SaHpiBoolT Active,
-                                     KviDsRptFnTable *FnTable, SaHpiUint32T MaplNum,
-                                     KviCsRwLockT *MaplLock, SaHpiResourceIdT *ResourceId) noexcept
+                                     void *UserDefined, SaHpiBoolT Active, KviDsRptFnTable *FnTable,
+                                     SaHpiUint32T MaplNum, KviCsRwLockT *MaplLock,
+                                     SaHpiResourceIdT *ResourceId) noexcept
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(ResourceId);
@@ -363,9 +377,8 @@ KVI_EXPORT SaErrorT kviCsRptEntryGetByRid(SaHpiDomainIdT DomainId, SaHpiResource
 
 KVI_EXPORT SaErrorT kviCsRptActiveEntryGetByRid(SaHpiDomainIdT DomainId,
                                                 SaHpiResourceIdT ResourceId,
-                                                SaHpiRptEntryT *RptEntry,
-                                                KviDsRptFnTable *FnTable, void **UserDefined,
-                                                SaHpiUint32T *MaplNum,
+                                                SaHpiRptEntryT *RptEntry, KviDsRptFnTable *FnTable,
+                                                void **UserDefined, SaHpiUint32T *MaplNum,
                                                 KviCsRwLockT **MaplLock) noexcept
 {
     KVI_TRACE("");
@@ -416,8 +429,8 @@ KVI_EXPORT SaErrorT kviCsRptEntryRemoveByRid(SaHpiDomainIdT DomainId,
 }
 
 KVI_EXPORT SaErrorT kviCsRptEntryUserPointerSetByRid(SaHpiDomainIdT DomainId,
-                                                     SaHpiResourceIdT ResourceId,
-                                                     void *UserDefined, void **OldPointer) noexcept
+                                                     SaHpiResourceIdT ResourceId, void *UserDefined,
+                                                     void **OldPointer) noexcept
 {
     KVI_TRACE("");
     CHECK_RESOURCE_ID(ResourceId);
@@ -492,7 +505,7 @@ KVI_EXPORT SaErrorT kviCsRptEntryModifySeverityByRid(SaHpiDomainIdT DomainId,
     KVI_TRACE("");
     CHECK_RESOURCE_ID(ResourceId);
     if (!validSeverity(Severity)) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid value for severity(%d)", Severity);
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid value for severity(%d)", kviRawEnum(Severity));
         return SA_ERR_HPI_INVALID_PARAMS;
     }
     LOCK_RPT_ENTRY(scope, DomainId, ResourceId);

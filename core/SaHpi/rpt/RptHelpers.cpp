@@ -42,9 +42,9 @@ bool releaseEntry(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId, KviCsLin
         clean = false;
     }
     if (entry->FnTable.RptEntryResourcesRemove != nullptr) {
-        SaErrorT rc = entry->FnTable.RptEntryResourcesRemove(
-            DomainId, ResourceId, &entry->RptEntry, entry->UserDefined, entry->Active,
-            &entry->FnTable);
+        SaErrorT rc = entry->FnTable.RptEntryResourcesRemove(DomainId, ResourceId, &entry->RptEntry,
+                                                             entry->UserDefined, entry->Active,
+                                                             &entry->FnTable);
         if (rc != SA_OK) {
             KVI_ELOG(KVI_LOG_ERR_NONFATAL, "RptEntryResourcesRemove failed with rc=%d; continuing",
                      rc);
@@ -169,9 +169,9 @@ KVI_EXPORT SaErrorT kviCsRptGetNode(KviCsRptContainerT *RptContainer, SaHpiResou
     return rc == SA_ERR_HPI_NOT_PRESENT ? SA_ERR_HPI_INVALID_RESOURCE : rc;
 }
 
-KVI_EXPORT SaErrorT kviCsRptGetRptEntryContainer(
-    KviCsRptContainerT *RptContainer, SaHpiResourceIdT ResourceId,
-    KviCsRptEntryContainerT **RptEntryContainer) noexcept
+KVI_EXPORT SaErrorT
+kviCsRptGetRptEntryContainer(KviCsRptContainerT *RptContainer, SaHpiResourceIdT ResourceId,
+                             KviCsRptEntryContainerT **RptEntryContainer) noexcept
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(RptContainer);

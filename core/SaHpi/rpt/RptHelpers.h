@@ -4,8 +4,20 @@
 // order, so it is written once here. Also the scoped hold of the RPT lock.
 #pragma once
 
+#include <cstring>
+
 #include "core/utils/KviTrace.h"
 #include "kvi/KviRpt.h"
+
+// The number stored in an enum field of a caller's structure, read without
+// assuming it is one of the enum's values: a C caller may store any int.
+template <typename Enum> SaHpiUint32T kviRawEnum(const Enum &Field) noexcept
+{
+    static_assert(sizeof(Enum) == sizeof(SaHpiUint32T));
+    SaHpiUint32T raw;
+    memcpy(&raw, &Field, sizeof raw);
+    return raw;
+}
 
 // The id under which a node's record is filed: the resource id of an RPT
 // node, the record id of an RDR node.
@@ -60,9 +72,7 @@ SaErrorT kviHashWalkNext(KviHashTable Table, SaHpiEntryIdT Current, KviHashKeyOf
 class KviRptLock
 {
   public:
-    explicit KviRptLock(SaHpiDomainIdT DomainId) noexcept : rc_(kviCsRptLockRpt(DomainId, &rpt_))
-    {
-    }
+    explicit KviRptLock(SaHpiDomainIdT DomainId) noexcept : rc_(kviCsRptLockRpt(DomainId, &rpt_)) {}
     ~KviRptLock() { release(); }
     KviRptLock(const KviRptLock &) = delete;
     KviRptLock &operator=(const KviRptLock &) = delete;

@@ -39,8 +39,7 @@ TEST(DomainTest, OnlyDomainZeroExists)
     EXPECT_EQ(kviCsGetRptContainerByDomainId(SAHPI_DEFAULT_DOMAIN_ID, nullptr),
               SA_ERR_HPI_INVALID_PARAMS);
     EXPECT_TRUE(log.contains("RptContainer pointer is NULL."));
-    EXPECT_EQ(kviCsRptGetRptContainer(SAHPI_DEFAULT_DOMAIN_ID, nullptr),
-              SA_ERR_HPI_INVALID_PARAMS);
+    EXPECT_EQ(kviCsRptGetRptContainer(SAHPI_DEFAULT_DOMAIN_ID, nullptr), SA_ERR_HPI_INVALID_PARAMS);
     EXPECT_EQ(rpt, nullptr);
 }
 

@@ -100,9 +100,7 @@ TEST_F(RptConcurrencyTest, RemovingOnePluginWhileOthersAdd)
     for (int i = 0; i < perPlugin; i++)
         addResource(SAHPI_TRUE, kOtherMapl, KviDsRptFnTable{}, nullptr, otherLock());
     std::atomic<int> added{0};
-    std::thread unloader([] {
-        EXPECT_EQ(kviCsRptEntrysRemoveByLock(0, otherLock()), SA_OK);
-    });
+    std::thread unloader([] { EXPECT_EQ(kviCsRptEntrysRemoveByLock(0, otherLock()), SA_OK); });
     runThreads(3, [&](int) {
         for (int i = 0; i < perPlugin / 2; i++)
             if (addResource(SAHPI_TRUE) != 0)

@@ -3,6 +3,7 @@
 // walk as a client sees it.
 #pragma once
 
+#include <cstring>
 #include <fstream>
 #include <iterator>
 #include <string>
@@ -13,6 +14,13 @@
 #include "KviDaemonCore.h"
 #include "core/utils/Memory.h"
 #include "support/KviTestSupport.h"
+
+// Stores a number that is none of the enum's values, as a C caller can.
+template <typename Enum> void storeRaw(Enum &Field, SaHpiInt32T Value)
+{
+    static_assert(sizeof(Enum) == sizeof(Value));
+    memcpy(&Field, &Value, sizeof Value);
+}
 
 // Plug-in numbers the tests add resources for; each fixture removes their
 // entries when it ends, so the table is empty between tests.
@@ -81,8 +89,7 @@ inline SaHpiRptEntryT makeRptEntry(SaHpiCapabilitiesT Capabilities = kAllRdrCapa
 
 inline SaHpiResourceIdT addResource(SaHpiBoolT Active, SaHpiUint32T Mapl = kTestMapl,
                                     const KviDsRptFnTable &FnTable = KviDsRptFnTable{},
-                                    void *UserDefined = nullptr,
-                                    KviCsRwLockT *Lock = testLock(),
+                                    void *UserDefined = nullptr, KviCsRwLockT *Lock = testLock(),
                                     SaHpiRptEntryT Entry = makeRptEntry())
 {
     KviDsRptFnTable table = FnTable;
@@ -108,8 +115,8 @@ inline SaHpiEntryIdT addRdr(SaHpiResourceIdT ResourceId, SaHpiRdrTypeT Type,
     KviDsRdrFnTable table = FnTable;
     SaHpiEntryIdT recordId = 0;
     KviCsRdrRecordNumT number{};
-    EXPECT_EQ(kviCsRdrAdd(SAHPI_DEFAULT_DOMAIN_ID, ResourceId, &rdr, UserDefined, &table,
-                          &recordId, &number),
+    EXPECT_EQ(kviCsRdrAdd(SAHPI_DEFAULT_DOMAIN_ID, ResourceId, &rdr, UserDefined, &table, &recordId,
+                          &number),
               SA_OK);
     return recordId;
 }
