@@ -1,5 +1,6 @@
 #include <gtest/gtest.h>
 
+#include <cstdio>
 #include <string>
 #include <vector>
 
@@ -17,8 +18,7 @@ TEST_F(DefaultRemovalSlotsTest, FreeTheUserBlockAndLogTheResource)
 {
     SaHpiInt32T blocks = liveBlocks();
     KviLogCapture log(KVI_LOG_DBG_L_NUM | KVI_LOG_FUNC_IN_NUM);
-    EXPECT_EQ(kviDsDefaultRptResourcesRemove(0, 5, nullptr, KVI_CS_MALLOC(16), SAHPI_TRUE,
-                                             nullptr),
+    EXPECT_EQ(kviDsDefaultRptResourcesRemove(0, 5, nullptr, KVI_CS_MALLOC(16), SAHPI_TRUE, nullptr),
               SA_OK);
     EXPECT_EQ(kviDsDefaultRdrResourcesRemove(0, 6, nullptr, KVI_CS_MALLOC(16), nullptr), SA_OK);
     EXPECT_EQ(liveBlocks(), blocks);
@@ -58,6 +58,20 @@ std::string lifecycleConfig(const KviTempDir &Dir, std::string_view Modules,
     return Dir.write("kvi.conf", WithModules ? kviTestMaplConfig(Modules, rest) : rest);
 }
 
+// The child's failed expectations, on its standard error where the parent
+// shows them; the exit status says whether there were any.
+int reportChildFailures()
+{
+    const testing::TestResult *result =
+        testing::UnitTest::GetInstance()->current_test_info()->result();
+    for (int i = 0; i < result->total_part_count(); i++) {
+        const testing::TestPartResult &part = result->GetTestPartResult(i);
+        if (part.failed())
+            fprintf(stderr, "%s:%d: %s\n", part.file_name(), part.line_number(), part.message());
+    }
+    return testing::Test::HasFailure() ? 1 : 0;
+}
+
 template <typename Scenario> void inFreshLibrary(const std::string &Config, Scenario scenario)
 {
     EXPECT_EXIT(
@@ -65,7 +79,7 @@ template <typename Scenario> void inFreshLibrary(const std::string &Config, Scen
             EXPECT_EQ(kviCsConfigInit(SAHPI_FALSE, Config.c_str()), SA_OK);
             EXPECT_EQ(kviDsApiRedirectorInitialize(), SA_OK);
             scenario();
-            exit(testing::Test::HasFailure() ? 1 : 0);
+            exit(reportChildFailures());
         },
         testing::ExitedWithCode(0), "");
 }
