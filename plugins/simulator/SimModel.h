@@ -242,8 +242,10 @@ void simWatchdogStarted() noexcept;
 // A text buffer in English.
 void simText(SaHpiTextBufferT *Buffer, const char *Text) noexcept;
 
+// The tables resources and records are registered with; one per record type.
+constexpr SaHpiUint32T SIM_RDR_TYPES = SAHPI_WATCHDOG_RDR + 1;
 extern KviDsRptFnTable simRptFnTable;
-extern KviDsRdrFnTable simRdrFnTable;
+extern KviDsRdrFnTable simRdrFnTables[SIM_RDR_TYPES];
 
 // ---- Areas. Model functions expect the resource's mutex held; slots take
 // it themselves. ----

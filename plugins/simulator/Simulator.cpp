@@ -373,7 +373,8 @@ SaErrorT registerResource(SaHpiDomainIdT DomainId, SimResourceT *Resource,
         buildRdr(record, &rdr);
         SaHpiEntryIdT recordId = 0;
         KviCsRdrRecordNumT num;
-        rc = kviCsRdrAdd(DomainId, rid, &rdr, record, &simRdrFnTable, &recordId, &num);
+        rc = kviCsRdrAdd(DomainId, rid, &rdr, record, &simRdrFnTables[record->Type], &recordId,
+                         &num);
         if (rc != SA_OK) {
             KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Simulator: kviCsRdrAdd failed. rc=%d, rid=%u", rc, rid);
             break;
@@ -616,13 +617,68 @@ void simText(SaHpiTextBufferT *Buffer, const char *Text) noexcept
     Buffer->DataLength = static_cast<SaHpiUint8T>(n);
 }
 
-// ---- The function tables, shared by every resource and every record ----
+// ---- The function tables ----
 //
-// Parameter control (RPT slots 24-26, RDR slots 16-18): the library's own
-// default implementations take these slots here once the library offers
-// them; until then the simulator keeps in-memory copies of its own
-// (SimParmControl.cpp): default restores the initial values, save keeps a
-// copy, restore puts it back.
+// Every resource shares one table; every record type has its own, built on
+// one base, so that parameter control can differ by type.
+
+namespace
+{
+
+struct SimRptParmSlotsT {
+    SaErrorT (*Default)(SaHpiDomainIdT, SaHpiResourceIdT);
+    KviDsSaveRptParmCtrl Save;
+    KviDsRestoreRptParmCtrl Restore;
+};
+
+struct SimRdrParmSlotsT {
+    KviDsDefaultRdrParmCtrl Default;
+    KviDsSaveRdrParmCtrl Save;
+    KviDsRestoreRdrParmCtrl Restore;
+};
+
+// Parameter control (RPT slots 24-26, RDR slots 16-18). This is the one
+// place where the library's default implementations take over, slot by slot
+// and record type by record type (for instance kviCsRdrSaveSensorParmControl
+// for sensors). Until then the simulator answers with in-memory copies of its
+// own (SimParmControl.cpp): default puts the initial values back, save keeps
+// a copy, restore puts the copy back.
+constexpr SimRptParmSlotsT RptParmSlots = {simRptDefaultParmControl, simRptSaveParmControl,
+                                           simRptRestoreParmControl};
+constexpr SimRdrParmSlotsT SensorParmSlots = {simRdrDefaultParmControl, simRdrSaveParmControl,
+                                              simRdrRestoreParmControl};
+constexpr SimRdrParmSlotsT ControlParmSlots = {simRdrDefaultParmControl, simRdrSaveParmControl,
+                                               simRdrRestoreParmControl};
+constexpr SimRdrParmSlotsT InventoryParmSlots = {simRdrDefaultParmControl, simRdrSaveParmControl,
+                                                 simRdrRestoreParmControl};
+constexpr SimRdrParmSlotsT WatchdogParmSlots = {simRdrDefaultParmControl, simRdrSaveParmControl,
+                                                simRdrRestoreParmControl};
+
+constexpr KviDsRdrFnTable rdrTable(const SimRdrParmSlotsT &Parm) noexcept
+{
+    return {
+        simSensorReadingGet,
+        simSensorReadingConvert,
+        simSensorThresholdsGet,
+        simSensorThresholdsSet,
+        simSensorEventEnablesGet,
+        simSensorEventEnablesSet,
+        simControlStateGet,
+        simControlStateSet,
+        simWatchdogTimerGet,
+        simWatchdogTimerSet,
+        simWatchdogTimerReset,
+        simEntityInventoryDataRead,
+        simEntityInventoryDataWrite,
+        simActiveAlarmTranslate,
+        simRdrResourcesRemove,
+        Parm.Default,
+        Parm.Save,
+        Parm.Restore,
+    };
+}
+
+} // namespace
 
 KviDsRptFnTable simRptFnTable = {
     simEventLogInfoGet,
@@ -648,18 +704,16 @@ KviDsRptFnTable simRptFnTable = {
     simResourceResetStateGet,
     simResourceResetStateSet,
     simRptEntryResourcesRemove,
-    simRptDefaultParmControl,
-    simRptSaveParmControl,
-    simRptRestoreParmControl,
+    RptParmSlots.Default,
+    RptParmSlots.Save,
+    RptParmSlots.Restore,
 };
 
-KviDsRdrFnTable simRdrFnTable = {
-    simSensorReadingGet,         simSensorReadingConvert,  simSensorThresholdsGet,
-    simSensorThresholdsSet,      simSensorEventEnablesGet, simSensorEventEnablesSet,
-    simControlStateGet,          simControlStateSet,       simWatchdogTimerGet,
-    simWatchdogTimerSet,         simWatchdogTimerReset,    simEntityInventoryDataRead,
-    simEntityInventoryDataWrite, simActiveAlarmTranslate,  simRdrResourcesRemove,
-    simRdrDefaultParmControl,    simRdrSaveParmControl,    simRdrRestoreParmControl,
+// Indexed by record type.
+KviDsRdrFnTable simRdrFnTables[SIM_RDR_TYPES] = {
+    rdrTable(SensorParmSlots), // SAHPI_NO_RECORD: never registered
+    rdrTable(ControlParmSlots),   rdrTable(SensorParmSlots),
+    rdrTable(InventoryParmSlots), rdrTable(WatchdogParmSlots),
 };
 
 // The one symbol the plug-in manager looks up.
