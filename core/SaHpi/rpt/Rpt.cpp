@@ -5,6 +5,7 @@
 
 #include "core/SaHpi/rpt/RptHelpers.h"
 #include "kvi/KviDomain.h"
+#include "kvi/KviParmControl.h"
 
 namespace
 {
@@ -98,19 +99,14 @@ class RptEntryScope
 // The settings of an entry that are kept across a restart of the daemon.
 enum class NvSetting { Tag, Severity };
 
-// The one place the tag and severity are to be written to the non-volatile
-// store, with the RPT lock still held: kviCsSaveResTagNV or
-// kviCsSaveResSeverityNV with the daemon flag SAHPI_TRUE. The saves are wired
-// in together with the parameter-control store; until then nothing is saved
-// and the change stands.
+// Tag and severity changes are kept across a restart (flag-1 keys, put back
+// by the daemon restore); saved with the RPT lock still held.
 SaErrorT saveToNonVolatile(NvSetting Setting, SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                            const SaHpiRptEntryT &Entry)
 {
-    (void)Setting;
-    (void)DomainId;
-    (void)ResourceId;
-    (void)Entry;
-    return SA_OK;
+    if (Setting == NvSetting::Tag)
+        return kviCsSaveResTagNV(DomainId, ResourceId, SAHPI_TRUE, &Entry.ResourceTag);
+    return kviCsSaveResSeverityNV(DomainId, ResourceId, SAHPI_TRUE, &Entry.ResourceSeverity);
 }
 
 // The first entry after From in the walk that is active, or SAHPI_LAST_ENTRY
