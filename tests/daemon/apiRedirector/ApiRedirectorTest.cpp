@@ -167,9 +167,13 @@ TEST(ApiLifecycleDeathTest, CallsBeforeInitializeAreRefused)
         EXPECT_EQ(saHpiSessionClose(1000), SA_ERR_HPI_UNINITIALIZED);
         EXPECT_EQ(saHpiResourcesDiscover(1000), SA_ERR_HPI_UNINITIALIZED);
         EXPECT_FALSE(kviTestMaplLoaded("KviTestMaplGoodA"));
+        // The set-up is the daemon's to make once.
+        EXPECT_EQ(kviDsApiRedirectorInitialize(), SA_ERR_HPI_ERROR);
     });
     EXPECT_TRUE(kviTestLoggedAt(log, KVI_LOG_DBG_H_NUM,
                                 "Cannot call saHpiFinalize before saHpiInitialize."));
+    EXPECT_TRUE(kviTestLoggedAt(log, KVI_LOG_ERR_FATAL_NUM,
+                                "kviDsMaplManagerInitialize failed. rc=-1017"));
     EXPECT_EQ(log.matching("SaHpi APIs may not be called before saHpiInitialize.").size(), 3u);
 }
 

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "KviTestMapls.h"
+#include "core/utils/Memory.h"
 #include "support/KviTestSupport.h"
 
 namespace
@@ -160,6 +161,42 @@ TEST(MaplManagerDeathTest, FinalizeStopsFollowingTheConfigurationButKeepsThePlug
     EXPECT_EXIT(exit(freshManager(config, check)), testing::ExitedWithCode(0), "");
     EXPECT_TRUE(log.contains("Unegistration of callback failed!"));
     EXPECT_TRUE(log.contains("Function called more than once-- bad"));
+}
+
+TEST(MaplManagerDeathTest, TablesThatCannotBeAllocatedEndTheProcess)
+{
+    KviTempDir dir;
+    const struct {
+        const char *lines;
+        SaHpiInt32T failAllocation; // counted from the manager's initialization
+        const char *fatalLine;
+    } cases[] = {
+        {LIMITS, 1, "Unable to allocate memory for MaplList"},
+        // No upper bound: -1 asks for more slots than can be allocated.
+        {"max_mapl_count = \"-1\"\n", 0, "Unable to allocate memory for MaplList"},
+        {LIMITS, 2, "Unable to allocate memory for the name of Mapl"},
+        {LIMITS, 3, "Unable to allocate memory for 2 Mapl locks"},
+        {"max_mapl_rwlocks_count = \"-1\"\n", 0,
+         "Unable to allocate memory for 4294967295 Mapl locks"},
+    };
+    for (const auto &c : cases) {
+        SCOPED_TRACE(c.fatalLine);
+        const std::string config =
+            dir.write("kvi.conf", kviTestMaplConfig(pathOf("KviTestMaplGoodA"), c.lines));
+        KviLogCapture log(KVI_LOG_ERR_FATAL_NUM);
+        auto child = [&] {
+            if (kviCsConfigInit(SAHPI_FALSE, config.c_str()) != SA_OK)
+                return 10;
+            // The first allocation of initialization is the slot table; the
+            // registration of the callback and of a plug-in follow.
+            kviCsMemoryFailNthAllocation(c.failAllocation);
+            if (kviDsMaplManagerInitialize() != SA_OK)
+                return 11;
+            return 20 + kviDsMaplManagerLoadMapls();
+        };
+        EXPECT_EXIT(exit(child()), testing::ExitedWithCode(1), "");
+        EXPECT_TRUE(kviTestLoggedAt(log, KVI_LOG_ERR_FATAL_NUM, c.fatalLine));
+    }
 }
 
 // ---- One manager for the rest of the process ----
