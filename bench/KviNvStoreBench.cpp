@@ -85,7 +85,7 @@ void BM_NvPutReplace(benchmark::State &state)
         if (kviCsNonVolatilePut("kviBenchKey0", sizeof SMALL_VALUE, SMALL_VALUE) != SA_OK)
             state.SkipWithError("put failed");
 }
-BENCHMARK(BM_NvPutReplace)->Arg(1)->Arg(1000)->Unit(benchmark::kMicrosecond);
+BENCHMARK(BM_NvPutReplace)->Arg(1)->Arg(1000)->Arg(10000)->Unit(benchmark::kMicrosecond);
 
 // What the directory sync before the old file's unlink costs a put.
 void BM_NvPutReplaceWithoutDirectorySync(benchmark::State &state)

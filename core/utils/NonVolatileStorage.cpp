@@ -165,21 +165,6 @@ void forgetStore()
     CurrentLastNvObject = 0;
 }
 
-// The lowest object number that no valid entry uses. Puts are serialized by
-// NvObjectDeleteSem, so the number cannot be taken before the file exists.
-SaHpiUint32T lowestFreeObjectNumber()
-{
-    requireListLocked();
-    for (SaHpiUint32T number = 0; number != NV_INVALID_OBJECT_NUMBER; ++number) {
-        bool used = false;
-        for (SaHpiUint32T i = 0; i < CurrentLastNvObject && !used; ++i)
-            used = NvObjectList[i].Valid && NvObjectList[i].FileNumber == number;
-        if (!used)
-            return number;
-    }
-    return NV_INVALID_OBJECT_NUMBER;
-}
-
 // The entry of the put in progress. Its index can change while the list lock
 // is not held (a get may drop a damaged entry in front of it), so it is found
 // again by its number: being serialized, only one put has such an entry.
@@ -682,6 +667,27 @@ SaHpiUint32T findNvObjectInListByFileNumber(SaHpiUint32T FileNumber) noexcept
         }
     }
     return NV_INVALID_LIST_ENTRY;
+}
+
+// The numbers are looked at a window at a time with a small bitmap, so a
+// full list of 100000 objects costs a few passes rather than one pass per
+// number tried.
+SaHpiUint32T lowestFreeObjectNumber() noexcept
+{
+    requireListLocked();
+    constexpr SaHpiUint32T WINDOW = 4096;
+    for (SaHpiUint32T base = 0; base <= NV_INVALID_OBJECT_NUMBER - WINDOW; base += WINDOW) {
+        SaHpiUint8T used[WINDOW / 8] = {};
+        for (SaHpiUint32T i = 0; i < CurrentLastNvObject; ++i) {
+            SaHpiUint32T offset = NvObjectList[i].FileNumber - base;
+            if (NvObjectList[i].Valid && NvObjectList[i].FileNumber >= base && offset < WINDOW)
+                used[offset / 8] |= static_cast<SaHpiUint8T>(1u << (offset % 8));
+        }
+        for (SaHpiUint32T offset = 0; offset < WINDOW; ++offset)
+            if ((used[offset / 8] & (1u << (offset % 8))) == 0)
+                return base + offset;
+    }
+    return NV_INVALID_OBJECT_NUMBER;
 }
 
 SaErrorT addNvObjectToList(const char *Key, SaHpiUint8T KeyLen, const char *FileName,

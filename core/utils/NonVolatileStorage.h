@@ -57,6 +57,10 @@ SaHpiUint32T findNvObjectInListByFileNumber(SaHpiUint32T FileNumber) noexcept;
 SaErrorT addNvObjectToList(const char *Key, SaHpiUint8T KeyLen, const char *FileName,
                            SaHpiBoolT Valid, SaHpiUint32T *ObjectIndex) noexcept;
 SaErrorT deleteNvObjectFromList(SaHpiUint32T ObjectIndex, SaHpiBoolT NeedLock) noexcept;
+// The lowest object number that no valid entry uses, for a new file; puts are
+// serialized by NvObjectDeleteSem, so it cannot be taken before the file
+// exists. NV_INVALID_OBJECT_NUMBER when every number is in use.
+SaHpiUint32T lowestFreeObjectNumber() noexcept;
 
 SaHpiBoolT nvKeyIsValid(const char *Key, SaHpiUint8T KeyLen) noexcept;
 // Checks the object file at FilePath and, when it is sound, hands the whole

@@ -326,6 +326,32 @@ TEST_F(NvStoreTest, ReplacingWritesTheLowestFreeNumberBeforeRemovingTheOldFile)
                          "Key k3 does not yet exist. Marking new object as valid."));
 }
 
+TEST_F(NvStoreTest, LowestFreeNumberIsFoundBeyondThousandsOfObjects)
+{
+    ASSERT_EQ(start("KviMaxNvObjects = \"5000\"\n"), SA_OK);
+    ASSERT_EQ(KVI_CS_SEM_TRYWAIT(kviCsNvListSemaphore()), SA_OK);
+    SaHpiUint32T index = 0;
+    auto add = [&](SaHpiUint32T number, SaHpiBoolT valid) {
+        std::string key = "k" + std::to_string(number);
+        return addNvObjectToList(key.c_str(), static_cast<SaHpiUint8T>(key.size()),
+                                 fileName(number).c_str(), valid, &index);
+    };
+    for (SaHpiUint32T i = 0; i < 4100; ++i) {
+        if (i != 4097) {
+            ASSERT_EQ(add(i, SAHPI_TRUE), SA_OK);
+        }
+    }
+    EXPECT_EQ(lowestFreeObjectNumber(), 4097u);
+    ASSERT_EQ(add(4097, SAHPI_TRUE), SA_OK);
+    ASSERT_EQ(add(4100, SAHPI_FALSE), SA_OK); // a put in progress does not count
+    EXPECT_EQ(lowestFreeObjectNumber(), 4100u);
+    ASSERT_EQ(deleteNvObjectFromList(17, SAHPI_FALSE), SA_OK);
+    EXPECT_EQ(lowestFreeObjectNumber(), 17u);
+    EXPECT_EQ(findNvObjectInListByFileNumber(4097), 4098u); // added after 4099, moved down by one
+    EXPECT_EQ(findNvObjectInListByFileNumber(4100), NV_INVALID_LIST_ENTRY);
+    ASSERT_EQ(KVI_CS_SEM_POST(kviCsNvListSemaphore()), SA_OK);
+}
+
 TEST_F(NvStoreTest, DeleteRemovesEntryAndFile)
 {
     ASSERT_EQ(start(), SA_OK);
