@@ -228,15 +228,17 @@ void syncDirectoryOf(char *Path)
     *slash = '\0';
     int fd = kviCsNvFileOps.openFile(Path, O_RDONLY | O_DIRECTORY, 0);
     if (fd >= 0) {
-        if (kviCsNvFileOps.syncFile(fd) != 0)
-            KVI_DLOG(KVI_LOG_DBG_H, "Could not sync directory %s. err=%d(%s)", Path, errno,
-                     strerror(errno));
+        if (kviCsNvFileOps.syncFile(fd) != 0) {
+            int err = errno;
+            KVI_DLOG(KVI_LOG_DBG_H, "Could not sync directory %s. err=%d(%s)", Path, err,
+                     strerror(err));
+        }
         kviCsNvFileOps.closeFile(fd);
     }
     *slash = '/';
 }
 
-// Steps 5 and 6 of a put: the new file, complete or not at all.
+// The new file of a put, written in one synchronous write.
 SaErrorT writeObjectFile(char *Path, const char *Key, SaHpiUint8T KeyLen, SaHpiUint32T BytesToWrite,
                          const void *Buffer)
 {
@@ -268,8 +270,8 @@ SaErrorT writeObjectFile(char *Path, const char *Key, SaHpiUint8T KeyLen, SaHpiU
     return SA_OK;
 }
 
-// Steps 2 to 4 of a put under the list lock: the number of the new file and
-// the entry for it, not valid yet.
+// The first half of a put, under the list lock: the number of the new file
+// and an entry for it, not valid until the file is complete.
 SaErrorT reserveObjectNumber(const char *Key, SaHpiUint8T KeyLen, SaHpiUint32T *Number, char **Path)
 {
     KVI_SEM_GUARD(list, &NvObjectListSem, NV_LIST_SEM_TIMEOUT);
@@ -305,10 +307,10 @@ SaErrorT reserveObjectNumber(const char *Key, SaHpiUint8T KeyLen, SaHpiUint32T *
     return SA_OK;
 }
 
-// Step 7 of a put: the new object becomes the key's object and the old one,
-// if any, leaves the list. Path, the new file's, is turned into the old
-// file's path for the unlink, which happens outside the list lock; both
-// names have ten digits, so no allocation can fail half-way through.
+// The second half of a put, once the file is complete: the new object becomes
+// the key's object and the old one, if any, leaves the list. Path, the new file's, is turned into
+// the old file's path for the unlink, which happens outside the list lock; both names have ten
+// digits, so no allocation can fail half-way through.
 SaErrorT publishObject(const char *Key, SaHpiUint8T KeyLen, SaHpiUint32T Number, char *Path,
                        bool *OldFileToDelete)
 {
@@ -373,8 +375,8 @@ SaErrorT registerScannedObject(const char *Path, const char *Name, const NvObjec
     return SA_OK;
 }
 
-// Step 6 of the initialization: every object file of the directory, in the
-// order the directory yields them.
+// Every object file of the directory, in the order the directory yields
+// them; of two files with one key the first one met is kept.
 SaErrorT loadObjects(DIR *Dir)
 {
     for (struct dirent *entry = readdir(Dir); entry != nullptr; entry = readdir(Dir)) {
@@ -400,7 +402,7 @@ SaErrorT loadObjects(DIR *Dir)
     return SA_OK;
 }
 
-// Steps 2 and 3 of the initialization.
+// The storage directory (required) and the object limit (optional).
 SaErrorT readConfiguration()
 {
     char dir[NV_STORAGE_DIR_BUFFER];
@@ -456,7 +458,7 @@ SaErrorT createSemaphoresOnce()
     return SA_OK;
 }
 
-// Steps 5 to 7 of the initialization.
+// Creates the storage directory if needed and loads the list from it.
 SaErrorT openAndLoadDirectory()
 {
     if (mkdir(NvStorageDir, 0777) != 0 && errno != EEXIST) {
