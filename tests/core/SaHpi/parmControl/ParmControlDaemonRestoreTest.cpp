@@ -1,8 +1,318 @@
+#include <cstdlib>
+#include <map>
+
 #include "tests/core/SaHpi/parmControl/ParmControlFixture.h"
 
 namespace
 {
 using namespace pctest;
+
+// ---------------------------------------------------------------------------
+// A restart of the daemon on the simulator plug-in.
+//
+// Each run of the daemon is a child process forked before this process
+// touched the library (death-test suites run first), so the second run meets
+// the library as a restarted daemon does: empty tables, resource ids counted
+// from 1 again, and only the store's directory left from the first run.
+
+// The test program links the library statically; the simulator resolves its
+// library names against the program, so each one it uses must be linked in.
+[[maybe_unused]] volatile const void *const SimulatorImports[] = {
+    reinterpret_cast<const void *>(&kviCsCfgDataUint32Get),
+    reinterpret_cast<const void *>(&kviCsDefaultEirSet),
+    reinterpret_cast<const void *>(&kviCsDefaultWatchdogSet),
+    reinterpret_cast<const void *>(&kviCsRdrAdd),
+    reinterpret_cast<const void *>(&kviCsRdrGetSensor),
+    reinterpret_cast<const void *>(&kviCsRdrGetWatchdog),
+    reinterpret_cast<const void *>(&kviCsRptEntryActiveStateSetByRid),
+    reinterpret_cast<const void *>(&kviCsRptEntryAdd),
+    reinterpret_cast<const void *>(&kviCsRptEntryGetByRid),
+    reinterpret_cast<const void *>(&kviCsRptEntryModifyByRid),
+    reinterpret_cast<const void *>(&kviCsRptEntryRemoveByRid),
+    reinterpret_cast<const void *>(&kviDsMaplManagerGetMaplLock),
+    reinterpret_cast<const void *>(&kviCsGetSaHpiTime),
+    reinterpret_cast<const void *>(&kviCsMalloc),
+    reinterpret_cast<const void *>(&kviCsFree),
+    reinterpret_cast<const void *>(&kviCsLogger),
+};
+
+std::string simulatorPath()
+{
+    const char *dir = getenv("KVI_TEST_BINARY_DIR");
+    return std::string(dir != nullptr ? dir : ".") + "/../plugins/libKviSimulator.so";
+}
+
+// The shelf as the library's tables show it, by resource tag and record
+// name, with what is needed to drive each record through its table.
+class Shelf
+{
+  public:
+    struct Record {
+        SaHpiRdrT Rdr;
+        KviDsRdrFnTable Fn;
+        void *UserData;
+    };
+
+    Shelf()
+    {
+        SaHpiEntryIdT entry = SAHPI_FIRST_ENTRY;
+        while (entry != SAHPI_LAST_ENTRY) {
+            SaHpiRptEntryT rpt{};
+            if (kviCsRptActiveEntryGet(0, entry, &entry, &rpt, nullptr) != SA_OK) {
+                ADD_FAILURE() << "no resources";
+                return;
+            }
+            rids_[str(rpt.ResourceTag)] = rpt.ResourceId;
+            SaHpiEntryIdT rdr = SAHPI_FIRST_ENTRY;
+            while (rdr != SAHPI_LAST_ENTRY) {
+                Record r{};
+                SaHpiBoolT active = SAHPI_FALSE;
+                if (kviCsRdrGet(0, rpt.ResourceId, SAHPI_NO_RECORD, rdr, &rdr, &r.Rdr, &active,
+                                &r.UserData, &r.Fn, nullptr, nullptr) != SA_OK)
+                    break;
+                records_[{rpt.ResourceId, str(r.Rdr.IdString)}] = r;
+            }
+        }
+    }
+
+    SaHpiResourceIdT rid(const std::string &Tag) const
+    {
+        auto it = rids_.find(Tag);
+        EXPECT_NE(it, rids_.end()) << Tag;
+        return it == rids_.end() ? 0 : it->second;
+    }
+    // A record that is not there is a failure, and the callers then leave it
+    // alone rather than call through an empty table.
+    Record *rec(SaHpiResourceIdT Rid, const std::string &Name)
+    {
+        auto it = records_.find({Rid, Name});
+        EXPECT_NE(it, records_.end()) << Name;
+        return it == records_.end() ? nullptr : &it->second;
+    }
+
+    SaHpiSensorThresholdsT thresholds(SaHpiResourceIdT Rid, const std::string &Name)
+    {
+        Record *r = rec(Rid, Name);
+        SaHpiSensorThresholdsT t{};
+        if (r == nullptr)
+            return t;
+        EXPECT_EQ(r->Fn.SensorThresholdsGet(0, Rid, r->Rdr.RdrTypeUnion.SensorRec.Num, &r->Rdr,
+                                            r->UserData, &t),
+                  SA_OK);
+        return t;
+    }
+    SaHpiSensorEvtEnablesT enables(SaHpiResourceIdT Rid, const std::string &Name)
+    {
+        Record *r = rec(Rid, Name);
+        SaHpiSensorEvtEnablesT e{};
+        if (r == nullptr)
+            return e;
+        EXPECT_EQ(r->Fn.SensorEventEnablesGet(0, Rid, r->Rdr.RdrTypeUnion.SensorRec.Num,
+                                              r->UserData, 0,
+                                              r->Rdr.RdrTypeUnion.SensorRec.Category, &e),
+                  SA_OK);
+        return e;
+    }
+    SaHpiCtrlStateT control(SaHpiResourceIdT Rid, const std::string &Name)
+    {
+        Record *r = rec(Rid, Name);
+        SaHpiCtrlStateT s{};
+        if (r == nullptr)
+            return s;
+        s.Type = r->Rdr.RdrTypeUnion.CtrlRec.Type;
+        EXPECT_EQ(r->Fn.ControlStateGet(0, Rid, r->Rdr.RdrTypeUnion.CtrlRec.Num, r->UserData, &s),
+                  SA_OK);
+        return s;
+    }
+
+    // What saHpiSensorThresholdsSet, saHpiSensorEventEnablesSet and
+    // saHpiControlStateSet do once the plug-in has taken the value: keep the
+    // daemon's copy.
+    void setThresholds(SaHpiResourceIdT Rid, const std::string &Name, SaHpiSensorThresholdsT T,
+                       bool KeepDaemonCopy = true)
+    {
+        Record *r = rec(Rid, Name);
+        if (r == nullptr)
+            return;
+        SaHpiSensorNumT num = r->Rdr.RdrTypeUnion.SensorRec.Num;
+        ASSERT_EQ(r->Fn.SensorThresholdsSet(0, Rid, num, &r->Rdr, &T, r->UserData), SA_OK);
+        if (KeepDaemonCopy) {
+            ASSERT_EQ(kviCsSaveThreshNV(0, Rid, num, SAHPI_TRUE, &T), SA_OK);
+        }
+    }
+    void setEnables(SaHpiResourceIdT Rid, const std::string &Name, SaHpiSensorEvtEnablesT E)
+    {
+        Record *r = rec(Rid, Name);
+        if (r == nullptr)
+            return;
+        SaHpiSensorNumT num = r->Rdr.RdrTypeUnion.SensorRec.Num;
+        ASSERT_EQ(r->Fn.SensorEventEnablesSet(0, Rid, num, &E, &r->Rdr, 0, r->UserData), SA_OK);
+        ASSERT_EQ(kviCsSaveEvtEnablesNV(0, Rid, num, SAHPI_TRUE, &E), SA_OK);
+    }
+    void setControl(SaHpiResourceIdT Rid, const std::string &Name, SaHpiCtrlStateT S,
+                    bool KeepDaemonCopy = true)
+    {
+        Record *r = rec(Rid, Name);
+        if (r == nullptr)
+            return;
+        SaHpiCtrlNumT num = r->Rdr.RdrTypeUnion.CtrlRec.Num;
+        ASSERT_EQ(r->Fn.ControlStateSet(0, Rid, num, &S, r->UserData), SA_OK);
+        if (KeepDaemonCopy) {
+            ASSERT_EQ(kviCsSaveCtrlStateNV(0, Rid, num, SAHPI_TRUE, &S), SA_OK);
+        }
+    }
+
+    // An explicit save or restore of a resource and its sensors and
+    // controls through the library's ready-made slots.
+    void explicitly(SaHpiResourceIdT Rid, bool Save)
+    {
+        KviDsRptFnTable fn{};
+        void *user = nullptr;
+        ASSERT_EQ(kviCsRptActiveEntryGetByRid(0, Rid, nullptr, &fn, &user, nullptr, nullptr),
+                  SA_OK);
+        EXPECT_EQ(Save ? kviCsRptSaveParmControl(0, Rid, &fn, user)
+                       : kviCsRptRestoreParmControl(0, Rid, &fn, user, SAHPI_FALSE),
+                  SA_OK);
+        for (auto &[key, r] : records_) {
+            if (key.first != Rid)
+                continue;
+            SCOPED_TRACE(key.second);
+            SaErrorT rc = SA_OK;
+            if (r.Rdr.RdrType == SAHPI_SENSOR_RDR)
+                rc = Save ? kviCsRdrSaveSensorParmControl(0, Rid, &r.Rdr, &r.Fn, r.UserData)
+                          : kviCsRdrRestoreSensor(0, Rid, SAHPI_FALSE, &r.Rdr, &r.Fn, r.UserData);
+            else if (r.Rdr.RdrType == SAHPI_CTRL_RDR)
+                rc = Save ? kviCsRdrSaveCtrlParmControl(0, Rid, &r.Rdr, &r.Fn, r.UserData)
+                          : kviCsRdrRestoreCtrl(0, Rid, SAHPI_FALSE, &r.Rdr, &r.Fn, r.UserData);
+            EXPECT_EQ(rc, SA_OK);
+        }
+    }
+
+  private:
+    std::map<std::string, SaHpiResourceIdT> rids_;
+    std::map<std::pair<SaHpiResourceIdT, std::string>, Record> records_;
+};
+
+SaHpiCtrlStateT analog(SaHpiCtrlStateAnalogT Value)
+{
+    SaHpiCtrlStateT s{SAHPI_CTRL_TYPE_ANALOG, {}};
+    s.StateUnion.Analog = Value;
+    return s;
+}
+
+SaHpiCtrlStateT discrete(SaHpiCtrlStateDiscreteT Value)
+{
+    SaHpiCtrlStateT s{SAHPI_CTRL_TYPE_DISCRETE, {}};
+    s.StateUnion.Discrete = Value;
+    return s;
+}
+
+SaHpiSensorThresholdsT upperLimits(SaHpiUint32T Minor, SaHpiUint32T Major)
+{
+    SaHpiSensorThresholdsT t{};
+    t.UpMinor = reading(Minor);
+    t.UpMajor = reading(Major);
+    return t;
+}
+
+// One run of the daemon: start, discover, the scenario, stop.
+template <typename Scenario> void daemonRun(const std::string &Config, Scenario scenario)
+{
+    EXPECT_EXIT(
+        {
+            KviLogCapture log(KVI_LOG_ERR_NONFATAL_NUM);
+            EXPECT_EQ(kviCsConfigInit(SAHPI_FALSE, Config.c_str()), SA_OK);
+            EXPECT_EQ(kviDsApiRedirectorInitialize(), SA_OK);
+            SaHpiVersionT version = 0;
+            SaHpiSessionIdT session = 0;
+            EXPECT_EQ(saHpiInitialize(&version), SA_OK);
+            EXPECT_EQ(saHpiSessionOpen(SAHPI_DEFAULT_DOMAIN_ID, &session, nullptr), SA_OK);
+            EXPECT_EQ(saHpiResourcesDiscover(session), SA_OK);
+            scenario();
+            EXPECT_EQ(saHpiFinalize(), SA_OK);
+            // The parent shows the child's standard error when it fails.
+            const testing::TestResult *result =
+                testing::UnitTest::GetInstance()->current_test_info()->result();
+            for (int i = 0; i < result->total_part_count(); i++)
+                if (result->GetTestPartResult(i).failed())
+                    fprintf(stderr, "%s\n", result->GetTestPartResult(i).message());
+            for (const std::string &line : log.lines())
+                fprintf(stderr, "%s\n", line.c_str());
+            exit(testing::Test::HasFailure() ? 1 : 0);
+        },
+        testing::ExitedWithCode(0), "");
+}
+
+TEST(DaemonRestoreDeathTest, ARestartedDaemonPutsBackWhatClientsChangedOnTheSimulator)
+{
+    KviTempDir dir;
+    const std::string config =
+        dir.write("kvi.conf", "mapl_modules = \"" + simulatorPath() + "\"\nKviNvStorageDir = \"" +
+                                  dir.file("nv") +
+                                  "\"\nmax_mapl_count = \"2\"\nmax_mapl_rwlocks_count = \"2\"\n");
+
+    daemonRun(config, [] {
+        Shelf shelf;
+        SaHpiResourceIdT chassis = shelf.rid("Chassis 1"), board = shelf.rid("Processor board 1");
+        ASSERT_TRUE(chassis != 0 && board != 0);
+
+        // The operating mode and a 12V limit change on the plug-in's side,
+        // not through an HPI call, so the daemon keeps no copy of them; an
+        // operator then saves the chassis and the board explicitly.
+        shelf.setControl(chassis, "Operating mode", discrete(3), false);
+        shelf.setThresholds(board, "Board 12V", upperLimits(208, 210), false);
+        shelf.explicitly(chassis, true);
+        shelf.explicitly(board, true);
+
+        // Clients then change settings through the HPI calls.
+        SaHpiTextBufferT tag = text("Rack 7 chassis");
+        EXPECT_EQ(kviCsRptEntryModifyTagByRid(0, chassis, &tag), SA_OK);
+        EXPECT_EQ(kviCsRptEntryModifySeverityByRid(0, chassis, SAHPI_MINOR), SA_OK);
+        shelf.setThresholds(chassis, "Inlet temperature", upperLimits(36, 42));
+        shelf.setEnables(chassis, "Inlet temperature",
+                         {SAHPI_SENSTAT_EVENTS_ENABLED,
+                          SAHPI_ES_UPPER_MINOR | SAHPI_ES_UPPER_MAJOR | SAHPI_ES_UPPER_CRIT,
+                          SAHPI_ES_UPPER_MINOR | SAHPI_ES_UPPER_MAJOR | SAHPI_ES_UPPER_CRIT});
+        shelf.setControl(chassis, "Display brightness", analog(30));
+    });
+
+    daemonRun(config, [] {
+        Shelf shelf;
+        SaHpiResourceIdT chassis = shelf.rid("Chassis 1"), board = shelf.rid("Processor board 1");
+        ASSERT_TRUE(chassis != 0 && board != 0);
+        // The plug-in starts from its own defaults.
+        EXPECT_EQ(shelf.control(chassis, "Display brightness").StateUnion.Analog, 75);
+        EXPECT_EQ(shelf.thresholds(chassis, "Inlet temperature").UpMajor.Raw, 40u);
+
+        // The daemon's copy comes back; the explicit save's does not.
+        ASSERT_EQ(kviCsDaemonRestoreDomain(0), SA_OK);
+        SaHpiRptEntryT entry{};
+        SaHpiBoolT active = SAHPI_FALSE;
+        ASSERT_EQ(kviCsRptEntryGetByRid(0, chassis, &entry, &active, nullptr), SA_OK);
+        EXPECT_EQ(str(entry.ResourceTag), "Rack 7 chassis");
+        EXPECT_EQ(entry.ResourceSeverity, SAHPI_MINOR);
+        SaHpiSensorThresholdsT inlet = shelf.thresholds(chassis, "Inlet temperature");
+        EXPECT_EQ(inlet.UpMinor.Raw, 36u);
+        EXPECT_EQ(inlet.UpMajor.Raw, 42u);
+        EXPECT_EQ(inlet.UpCritical.Raw, 45u);
+        EXPECT_EQ(shelf.enables(chassis, "Inlet temperature").AssertEvents,
+                  SAHPI_ES_UPPER_MINOR | SAHPI_ES_UPPER_MAJOR | SAHPI_ES_UPPER_CRIT);
+        EXPECT_EQ(shelf.control(chassis, "Display brightness").StateUnion.Analog, 30);
+        EXPECT_EQ(shelf.control(chassis, "Operating mode").StateUnion.Discrete, 1u);
+        EXPECT_EQ(shelf.thresholds(board, "Board 12V").UpMinor.Raw, 207u);
+
+        // An explicit restore goes back to what the operator saved.
+        shelf.explicitly(chassis, false);
+        shelf.explicitly(board, false);
+        ASSERT_EQ(kviCsRptEntryGetByRid(0, chassis, &entry, &active, nullptr), SA_OK);
+        EXPECT_EQ(str(entry.ResourceTag), "Chassis 1");
+        EXPECT_EQ(entry.ResourceSeverity, SAHPI_CRITICAL);
+        EXPECT_EQ(shelf.control(chassis, "Operating mode").StateUnion.Discrete, 3u);
+        EXPECT_EQ(shelf.control(chassis, "Display brightness").StateUnion.Analog, 75);
+        EXPECT_EQ(shelf.thresholds(chassis, "Inlet temperature").UpMajor.Raw, 40u);
+        EXPECT_EQ(shelf.thresholds(board, "Board 12V").UpMinor.Raw, 208u);
+    });
+}
 
 class DaemonRestoreTest : public ParmControlTest
 {
