@@ -1,5 +1,3 @@
-#include "core/SaHpi/parmControl/ParmControlHelpers.h"
-
 #include <cstddef>
 
 #include "core/utils/Memory.h"
@@ -266,28 +264,6 @@ TEST_F(ParmControlHelpersTest, InventoryBuffersThatCannotBeHadAreOutOfSpace)
     kviCsMemoryFailNthAllocation(0);
     EXPECT_EQ(log.matching("Malloc failed").size(), 2u);
     EXPECT_EQ(kviTestLiveBlocks(), before);
-}
-
-TEST_F(ParmControlHelpersTest, RestoreReadResultDependsOnWhoRestores)
-{
-    KviLogCapture log;
-    const KviRestoreTextsT texts = {"nothing saved", SA_ERR_HPI_INVALID_REQUEST, "read failed %d",
-                                    false};
-    const KviRestoreTextsT keeps = {"nothing saved", SA_ERR_HPI_ERROR, "read failed %d", true};
-    bool found = true;
-    EXPECT_EQ(kviCsRestoreReadResult(SA_OK, SAHPI_FALSE, texts, &found), SA_OK);
-    EXPECT_TRUE(found);
-    EXPECT_EQ(kviCsRestoreReadResult(SA_ERR_HPI_NOT_PRESENT, SAHPI_TRUE, texts, &found), SA_OK);
-    EXPECT_FALSE(found);
-    EXPECT_FALSE(log.contains("nothing saved"));
-    EXPECT_EQ(kviCsRestoreReadResult(SA_ERR_HPI_NOT_PRESENT, SAHPI_FALSE, texts, &found),
-              SA_ERR_HPI_INVALID_REQUEST);
-    EXPECT_TRUE(log.contains("nothing saved"));
-    EXPECT_EQ(kviCsRestoreReadResult(SA_ERR_HPI_DATA_TRUNCATED, SAHPI_TRUE, texts, &found),
-              SA_ERR_HPI_ERROR);
-    EXPECT_TRUE(log.contains("read failed -1008"));
-    EXPECT_EQ(kviCsRestoreReadResult(SA_ERR_HPI_DATA_TRUNCATED, SAHPI_TRUE, keeps, &found),
-              SA_ERR_HPI_DATA_TRUNCATED);
 }
 
 } // namespace
