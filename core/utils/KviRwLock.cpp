@@ -349,9 +349,13 @@ SaErrorT kviCsRwLockRdUnlock(const char *FileName, const char *FuncName, int Lin
                  static_cast<int>(RwLock->NumReaders));
         exit(1);
     }
-    if (--RwLock->NumReaders == 0)
-        postOrDie(RwLock, {kAccess});
+    const bool lastReader = --RwLock->NumReaders == 0;
     postOrDie(RwLock, {kReadMutex});
+    // The group's Access goes back last: it can let in the writer that
+    // unloads a plug-in and destroys this lock, so nothing of the lock may be
+    // touched after it. A reader arriving in between waits on Access.
+    if (lastReader)
+        postOrDie(RwLock, {kAccess});
     call.trace(KVI_LOG_SEM, "Done");
     return SA_OK;
 }
