@@ -637,20 +637,19 @@ struct SimRdrParmSlotsT {
     KviDsRestoreRdrParmCtrl Restore;
 };
 
-// Parameter control (RPT slots 24-26, RDR slots 16-18). This is the one
-// place where the library's default implementations take over, slot by slot
-// and record type by record type (for instance kviCsRdrSaveSensorParmControl
-// for sensors). Until then the simulator answers with in-memory copies of its
-// own (SimParmControl.cpp): default puts the initial values back, save keeps
-// a copy, restore puts the copy back.
-constexpr SimRptParmSlotsT RptParmSlots = {simRptDefaultParmControl, simRptSaveParmControl,
-                                           simRptRestoreParmControl};
-constexpr SimRdrParmSlotsT SensorParmSlots = {simRdrDefaultParmControl, simRdrSaveParmControl,
-                                              simRdrRestoreParmControl};
-constexpr SimRdrParmSlotsT ControlParmSlots = {simRdrDefaultParmControl, simRdrSaveParmControl,
-                                               simRdrRestoreParmControl};
-constexpr SimRdrParmSlotsT InventoryParmSlots = {simRdrDefaultParmControl, simRdrSaveParmControl,
-                                                 simRdrRestoreParmControl};
+// Parameter control (RPT slots 24-26, RDR slots 16-18). Saving and restoring
+// go through the library's implementations, which keep the settings in its
+// non-volatile store, so they survive a restart of the daemon. Defaults the
+// library has no implementation for (the resource itself, sensors,
+// inventory, watchdogs) are the simulator's own: they put the initial values
+// back. Inventory and watchdog data are not kept across a restart.
+constexpr SimRptParmSlotsT RptParmSlots = {simRptDefaultParmControl, kviCsRptSaveParmControl,
+                                           kviCsRptRestoreParmControl};
+constexpr SimRdrParmSlotsT SensorParmSlots = {simRdrDefaultParmControl,
+                                              kviCsRdrSaveSensorParmControl, kviCsRdrRestoreSensor};
+constexpr SimRdrParmSlotsT ControlParmSlots = {kviCsRestoreControlDefaults,
+                                               kviCsRdrSaveCtrlParmControl, kviCsRdrRestoreCtrl};
+constexpr SimRdrParmSlotsT InventoryParmSlots = {simRdrDefaultParmControl, nullptr, nullptr};
 constexpr SimRdrParmSlotsT WatchdogParmSlots = {simRdrDefaultParmControl, simRdrSaveParmControl,
                                                 simRdrRestoreParmControl};
 

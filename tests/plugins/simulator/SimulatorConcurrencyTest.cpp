@@ -108,8 +108,6 @@ void client(const std::vector<Target> &Targets, unsigned Seed, const std::atomic
                            d, r, 0, 8192, Data,
                            reinterpret_cast<SaHpiInventoryDataT *>(buffer.data()),
                            &actual) == SA_OK);
-                expect(Fn.RdrSaveParmControl(d, r, &Rdr, &Fn, Data) == SA_OK);
-                expect(Fn.RdrRestoreParmControl(d, r, SAHPI_FALSE, &Rdr, &Fn, Data) == SA_OK);
                 break;
             }
             case SAHPI_WATCHDOG_RDR: {

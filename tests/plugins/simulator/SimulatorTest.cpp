@@ -76,12 +76,14 @@ class SimulatorTest : public testing::Test
                              "KviSimFanTrays = \"1\"\n"
                              "KviSimFans = \"3\"\n"
                              "KviSimPowerSupplies = \"1\"\n"
-                             "KviSimEventLogSize = \"4\"\n";
+                             "KviSimEventLogSize = \"4\"\n"
+                             "KviNvStorageDir = \"" + dir_->path() + "\"\n";
         ASSERT_EQ(kviCsConfigInit(SAHPI_FALSE, dir_->write("sim.conf", config).c_str()), SA_OK);
         ASSERT_EQ(kviCsDomainInitialize(), SA_OK);
         ASSERT_EQ(kviCsRdrInitialize(), SA_OK);
         ASSERT_EQ(kviDsMaplManagerInitialize(), SA_OK);
-        baselineBlocks_ = kviTestLiveBlocks();
+        baselineBlocks_ = kviTestLiveBlocks(); // the store holds what tests saved: not counted
+        ASSERT_EQ(kviCsNonVolatileInitialize(), SA_OK);
         load();
     }
 
@@ -1166,23 +1168,11 @@ TEST_F(SimulatorTest, HotSwapSlotsKeepTheirState)
     EXPECT_EQ(timeout, SAHPI_TIMEOUT_BLOCK);
     EXPECT_EQ(r.Fn.AutoExtractTimeoutSet(DOMAIN, id, -2, r.UserDefined), SA_ERR_HPI_INVALID_PARAMS);
 
-    // The resource's parameters: default, save and restore.
-    ASSERT_EQ(r.Fn.RptSaveParmControl(DOMAIN, id, nullptr, r.UserDefined), SA_OK);
+    // The resource's own default puts the hot-swap settings back.
     ASSERT_EQ(r.Fn.RptDefaultParmControl(DOMAIN, id), SA_OK);
     ASSERT_EQ(r.Fn.AutoExtractTimeoutGet(DOMAIN, id, r.UserDefined, &timeout), SA_OK);
     EXPECT_NE(timeout, SAHPI_TIMEOUT_BLOCK);
-    ASSERT_EQ(r.Fn.RptRestoreParmControl(DOMAIN, id, nullptr, r.UserDefined, SAHPI_FALSE), SA_OK);
-    ASSERT_EQ(r.Fn.AutoExtractTimeoutGet(DOMAIN, id, r.UserDefined, &timeout), SA_OK);
-    EXPECT_EQ(timeout, SAHPI_TIMEOUT_BLOCK);
     EXPECT_EQ(r.Fn.RptDefaultParmControl(DOMAIN, 999), SA_ERR_HPI_INVALID_RESOURCE);
-    const Resource &other = res("Processor board 1");
-    EXPECT_EQ(other.Fn.RptRestoreParmControl(DOMAIN, other.Entry.ResourceId, nullptr,
-                                             other.UserDefined, SAHPI_FALSE),
-              SA_ERR_HPI_INVALID_REQUEST)
-        << "nothing saved";
-    EXPECT_EQ(other.Fn.RptRestoreParmControl(DOMAIN, other.Entry.ResourceId, nullptr,
-                                             other.UserDefined, SAHPI_TRUE),
-              SA_OK);
 }
 
 TEST_F(SimulatorTest, RecordParametersAreDefaultedSavedAndRestored)
@@ -1201,14 +1191,7 @@ TEST_F(SimulatorTest, RecordParametersAreDefaultedSavedAndRestored)
             return r.Fn.RdrRestoreParmControl(DOMAIN, rid(chassis), Daemon, &rdr, &fn, r.UserData);
         }
     };
-    const Record &fresh = rec(chassis, "Operating mode");
-    EXPECT_EQ(fresh.Fn.RdrRestoreParmControl(DOMAIN, rid(chassis), SAHPI_FALSE, nullptr, nullptr,
-                                             fresh.UserData),
-              SA_ERR_HPI_INVALID_REQUEST);
-    EXPECT_EQ(fresh.Fn.RdrRestoreParmControl(DOMAIN, rid(chassis), SAHPI_TRUE, nullptr, nullptr,
-                                             fresh.UserData),
-              SA_OK);
-
+    // Saving and restoring go through the library's store.
     SaHpiCtrlStateT s{};
     s.Type = SAHPI_CTRL_TYPE_ANALOG;
     s.StateUnion.Analog = 10;
@@ -1220,24 +1203,6 @@ TEST_F(SimulatorTest, RecordParametersAreDefaultedSavedAndRestored)
     EXPECT_EQ(control(chassis, "Display brightness").StateUnion.Analog, 10);
     ASSERT_EQ(slot(0), SA_OK);
     EXPECT_EQ(control(chassis, "Display brightness").StateUnion.Analog, 75);
-
-    // Text controls save every line.
-    const Record &panel = rec(chassis, "Front panel display");
-    ASSERT_EQ(
-        panel.Fn.RdrDefaultParmControl(DOMAIN, rid(chassis), nullptr, nullptr, panel.UserData),
-        SA_OK);
-    ASSERT_EQ(panel.Fn.RdrSaveParmControl(DOMAIN, rid(chassis), nullptr, nullptr, panel.UserData),
-              SA_OK);
-    s = {};
-    s.Type = SAHPI_CTRL_TYPE_TEXT;
-    s.StateUnion.Text.Line = SAHPI_TLN_ALL_LINES;
-    s.StateUnion.Text.Text = textBuffer("x");
-    ASSERT_EQ(setControl(chassis, "Front panel display", s), SA_OK);
-    ASSERT_EQ(panel.Fn.RdrRestoreParmControl(DOMAIN, rid(chassis), SAHPI_FALSE, nullptr, nullptr,
-                                             panel.UserData),
-              SA_OK);
-    EXPECT_EQ(textOf(control(chassis, "Front panel display").StateUnion.Text.Text),
-              "Kvi simulator   shelf ready");
 
     // Sensors: thresholds and enables.
     const std::string board = "Processor board 2";
@@ -1293,7 +1258,9 @@ TEST_F(SimulatorTest, UnloadingRemovesTheShelfAndFreesItsMemory)
     SaHpiRptEntryT entry{};
     EXPECT_EQ(kviCsRptActiveEntryGet(DOMAIN, SAHPI_FIRST_ENTRY, &next, &entry, nullptr),
               SA_ERR_HPI_NOT_PRESENT);
+    ASSERT_EQ(kviCsNonVolatileFinalize(), SA_OK);
     EXPECT_EQ(kviTestLiveBlocks(), baselineBlocks_);
+    ASSERT_EQ(kviCsNonVolatileInitialize(), SA_OK);
 
     // Loaded again, the same shelf comes back under new ids.
     load();
