@@ -14,7 +14,8 @@ build: deps
 
 check: deps $(addprefix check-,$(PRESETS))
 
-check-%:
+# A static pattern rule: make skips implicit rules for phony targets.
+$(addprefix check-,$(PRESETS)): check-%: deps
 	cmake --preset $*
 	cmake --build --preset $*
 	ctest --preset $*
