@@ -1,7 +1,7 @@
 # The commands of the README. `make check` is what CI runs.
 PRESETS := default asan tsan
 
-.PHONY: all deps check build bench fuzz clean $(addprefix check-,$(PRESETS))
+.PHONY: all deps check build bench demo fuzz clean $(addprefix check-,$(PRESETS))
 
 all: build
 
@@ -19,6 +19,11 @@ $(addprefix check-,$(PRESETS)): check-%: deps
 	cmake --preset $*
 	cmake --build --preset $*
 	ctest --preset $*
+
+# The demo daemon on the simulated shelf, run twice from the build directory:
+# the second run shows the setting the first one saved.
+demo: build
+	cd build/default && ./KviDemo ../../examples/simulator.conf && ./KviDemo ../../examples/simulator.conf
 
 bench: build
 	@for b in build/default/bench/*Bench; do echo "== $$b"; $$b || exit 1; done

@@ -35,7 +35,7 @@ extern "C" {
 /*
  * The library implements the entry points in C++ and marks them noexcept so
  * that no exception ever crosses into a C caller. C++ rejects a definition
- * whose exception specification differs from its declaration, so the
+ * that is noexcept after a declaration that is not, so the
  * declarations carry it too; C sees nothing. The same macro, spelled the
  * same way, is in kvi/KviExport.h: this header must also stand alone.
  */
