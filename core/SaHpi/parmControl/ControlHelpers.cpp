@@ -14,33 +14,25 @@ constexpr KviRestoreTextsT CTRL_STATE_TEXTS = {
     "Failed to get control state from NV", false};
 
 // The record's own default for its type; false for a type HPI does not know.
+// The state and the record name each type's member alike.
 bool defaultState(const SaHpiCtrlRecT &Ctrl, SaHpiCtrlStateT *State) noexcept
 {
     memcpy(&State->Type, &Ctrl.Type, sizeof State->Type);
-    SaHpiCtrlStateUnionT &state = State->StateUnion;
-    const SaHpiCtrlRecUnionT &record = Ctrl.TypeUnion;
+#define KVI_CTRL_DEFAULT(Type, Member)                                                             \
+    case Type:                                                                                     \
+        State->StateUnion.Member = Ctrl.TypeUnion.Member.Default;                                  \
+        return true
     switch (kviCsRawEnum(Ctrl.Type)) {
-    case SAHPI_CTRL_TYPE_DIGITAL:
-        state.Digital = record.Digital.Default;
-        return true;
-    case SAHPI_CTRL_TYPE_DISCRETE:
-        state.Discrete = record.Discrete.Default;
-        return true;
-    case SAHPI_CTRL_TYPE_ANALOG:
-        state.Analog = record.Analog.Default;
-        return true;
-    case SAHPI_CTRL_TYPE_STREAM:
-        state.Stream = record.Stream.Default;
-        return true;
-    case SAHPI_CTRL_TYPE_TEXT:
-        state.Text = record.Text.Default;
-        return true;
-    case SAHPI_CTRL_TYPE_OEM:
-        state.Oem = record.Oem.Default;
-        return true;
+        KVI_CTRL_DEFAULT(SAHPI_CTRL_TYPE_DIGITAL, Digital);
+        KVI_CTRL_DEFAULT(SAHPI_CTRL_TYPE_DISCRETE, Discrete);
+        KVI_CTRL_DEFAULT(SAHPI_CTRL_TYPE_ANALOG, Analog);
+        KVI_CTRL_DEFAULT(SAHPI_CTRL_TYPE_STREAM, Stream);
+        KVI_CTRL_DEFAULT(SAHPI_CTRL_TYPE_TEXT, Text);
+        KVI_CTRL_DEFAULT(SAHPI_CTRL_TYPE_OEM, Oem);
     default:
         return false;
     }
+#undef KVI_CTRL_DEFAULT
 }
 
 } // namespace

@@ -18,6 +18,35 @@ constexpr KviRestoreTextsT EVENT_ENABLE_TEXTS = {"", SA_OK, "Failed to get senso
 constexpr KviRestoreTextsT CTRL_STATE_TEXTS = {"", SA_OK, "Failed to get control state from NV",
                                                false};
 
+// Puts back the daemon's copy of one record setting, if there is one: Get
+// reads it, Apply writes it through the record's table.
+template <typename T>
+SaErrorT restoreDaemonCopy(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId, SaHpiUint8T Num,
+                           SaHpiRdrT *Rdr, KviDsRdrFnTable *FnTable, void *UserData,
+                           SaErrorT (*Get)(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiUint8T,
+                                           SaHpiBoolT, T *),
+                           const KviRestoreTextsT &Texts, const char *Restoring,
+                           SaErrorT (*Apply)(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRdrT *,
+                                             KviDsRdrFnTable *, void *, T *)) noexcept
+{
+    T value;
+    bool found = false;
+    SaErrorT rc = kviCsRestoreReadResult(Get(DomainId, ResourceId, Num, SAHPI_TRUE, &value),
+                                         SAHPI_TRUE, Texts, &found);
+    if (rc != SA_OK || !found)
+        return rc;
+    KVI_DLOG(KVI_LOG_DBG_L, "%s", Restoring);
+    return Apply(DomainId, ResourceId, Rdr, FnTable, UserData, &value);
+}
+
+// A set slot that is empty fails the restore.
+SaErrorT applyCtrlState(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId, SaHpiRdrT *Rdr,
+                        KviDsRdrFnTable *FnTable, void *UserData, SaHpiCtrlStateT *State) noexcept
+{
+    return kviCsApplyCtrlState(DomainId, ResourceId, Rdr, FnTable, UserData, State,
+                               SA_ERR_HPI_ERROR);
+}
+
 SaErrorT restoreSensor(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                        KviRdrVisitT *Record) noexcept
 {
@@ -163,15 +192,9 @@ KVI_EXPORT SaErrorT kviCsDeamonRestoreSensorThresh(SaHpiDomainIdT DomainId,
     KVI_TRACE("domain=%u, rid=%u, sensor=%u", DomainId, ResourceId, SensorNum);
     KVI_NULL_CHECK(Rdr);
     KVI_NULL_CHECK(FnTable);
-    SaHpiSensorThresholdsT thresholds;
-    bool found = false;
-    SaErrorT rc = kviCsRestoreReadResult(
-        kviCsGetThreshNV(DomainId, ResourceId, SensorNum, SAHPI_TRUE, &thresholds), SAHPI_TRUE,
-        THRESHOLD_TEXTS, &found);
-    if (rc != SA_OK || !found)
-        return rc;
-    KVI_DLOG(KVI_LOG_DBG_L, "Restoring sensor thresholds.");
-    return kviCsApplySensorThresholds(DomainId, ResourceId, Rdr, FnTable, UserData, &thresholds);
+    return restoreDaemonCopy(DomainId, ResourceId, SensorNum, Rdr, FnTable, UserData,
+                             kviCsGetThreshNV, THRESHOLD_TEXTS, "Restoring sensor thresholds.",
+                             kviCsApplySensorThresholds);
 }
 
 KVI_EXPORT SaErrorT kviCsDeamonRestoreEventEnables(SaHpiDomainIdT DomainId,
@@ -183,15 +206,9 @@ KVI_EXPORT SaErrorT kviCsDeamonRestoreEventEnables(SaHpiDomainIdT DomainId,
     KVI_TRACE("domain=%u, rid=%u, sensor=%u", DomainId, ResourceId, SensorNum);
     KVI_NULL_CHECK(Rdr);
     KVI_NULL_CHECK(FnTable);
-    SaHpiSensorEvtEnablesT enables;
-    bool found = false;
-    SaErrorT rc = kviCsRestoreReadResult(
-        kviCsGetEvtEnablesNV(DomainId, ResourceId, SensorNum, SAHPI_TRUE, &enables), SAHPI_TRUE,
-        EVENT_ENABLE_TEXTS, &found);
-    if (rc != SA_OK || !found)
-        return rc;
-    KVI_DLOG(KVI_LOG_DBG_L, "Restoring sensor event enables.");
-    return kviCsApplySensorEventEnables(DomainId, ResourceId, Rdr, FnTable, UserData, &enables);
+    return restoreDaemonCopy(DomainId, ResourceId, SensorNum, Rdr, FnTable, UserData,
+                             kviCsGetEvtEnablesNV, EVENT_ENABLE_TEXTS,
+                             "Restoring sensor event enables.", kviCsApplySensorEventEnables);
 }
 
 KVI_EXPORT SaErrorT kviCsDeamonRestoreCtrlState(SaHpiDomainIdT DomainId,
@@ -202,14 +219,7 @@ KVI_EXPORT SaErrorT kviCsDeamonRestoreCtrlState(SaHpiDomainIdT DomainId,
     KVI_TRACE("domain=%u, rid=%u, control=%u", DomainId, ResourceId, CtrlNum);
     KVI_NULL_CHECK(Rdr);
     KVI_NULL_CHECK(FnTable);
-    SaHpiCtrlStateT state;
-    bool found = false;
-    SaErrorT rc = kviCsRestoreReadResult(
-        kviCsGetCtrlStateNV(DomainId, ResourceId, CtrlNum, SAHPI_TRUE, &state), SAHPI_TRUE,
-        CTRL_STATE_TEXTS, &found);
-    if (rc != SA_OK || !found)
-        return rc;
-    KVI_DLOG(KVI_LOG_DBG_L, "Restoring control state.");
-    return kviCsApplyCtrlState(DomainId, ResourceId, Rdr, FnTable, UserData, &state,
-                               SA_ERR_HPI_ERROR);
+    return restoreDaemonCopy(DomainId, ResourceId, CtrlNum, Rdr, FnTable, UserData,
+                             kviCsGetCtrlStateNV, CTRL_STATE_TEXTS, "Restoring control state.",
+                             applyCtrlState);
 }

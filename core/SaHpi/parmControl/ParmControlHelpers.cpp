@@ -27,9 +27,27 @@ constexpr SaHpiUint32T FRU_LENGTH_WORD = sizeof(SaHpiUint32T);
 constexpr SaHpiUint32T FRU_EXTRA = FRU_LENGTH_WORD + 3;
 constexpr SaHpiUint32T FRU_SIZE_MASK = 0xFFFF;
 
-SaErrorT putItem(const char *Key, SaHpiUint32T Length, const void *Value) noexcept
+// A setting's key: of the resource, or with Num of one of its records.
+struct NvKey {
+    char Text[KVI_MAX_NV_KEY_LENGTH];
+
+    NvKey(const char *Prefix, SaHpiBoolT Flag, SaHpiDomainIdT DomainId,
+          SaHpiResourceIdT ResourceId) noexcept
+    {
+        KVI_CREATE_NV_PARMCTRL_KEY_RPT(Text, Prefix, Flag, DomainId, ResourceId);
+    }
+    NvKey(const char *Prefix, SaHpiBoolT Flag, SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
+          SaHpiUint8T Num) noexcept
+    {
+        KVI_CREATE_NV_PARMCTRL_KEY_RDR(Text, Prefix, Flag, DomainId, ResourceId, Num);
+    }
+};
+
+SaErrorT putItem(const NvKey &Key, const char *Storing, SaHpiUint32T Length,
+                 const void *Value) noexcept
 {
-    SaErrorT rc = kviCsNonVolatilePut(Key, Length, Value);
+    KVI_DLOG(KVI_LOG_DBG_L, "%s", Storing);
+    SaErrorT rc = kviCsNonVolatilePut(Key.Text, Length, Value);
     if (rc != SA_OK) {
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "kviCsNonVolatilePut failed. rc=%d\n", rc);
         return SA_ERR_HPI_ERROR;
@@ -55,11 +73,11 @@ SaErrorT getItem(const char *Key, SaHpiBoolT IsDaemonSave, SaHpiUint32T Length, 
     return SA_ERR_HPI_ERROR;
 }
 
-SaErrorT getWhole(const char *Key, SaHpiBoolT IsDaemonSave, SaHpiUint32T Length,
+SaErrorT getWhole(const NvKey &Key, SaHpiBoolT IsDaemonSave, SaHpiUint32T Length,
                   void *Value) noexcept
 {
     SaHpiUint32T bytesRead = 0;
-    return getItem(Key, IsDaemonSave, Length, Value, &bytesRead, false);
+    return getItem(Key.Text, IsDaemonSave, Length, Value, &bytesRead, false);
 }
 
 SaHpiUint32T ctrlStateLength(const SaHpiCtrlStateT *CtrlState) noexcept
@@ -105,11 +123,8 @@ KVI_EXPORT SaErrorT kviCsSaveEvtLogStNV(SaHpiDomainIdT DomainId, SaHpiResourceId
                                         SaHpiBoolT IsDaemonSave, SaHpiBoolT Enable) noexcept
 {
     KVI_TRACE("");
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RPT(key, KVI_NVKEY_EVENT_LOG_ST_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId);
-    KVI_DLOG(KVI_LOG_DBG_L, "Storing event log state in Non-Vol. memory");
-    return putItem(key, sizeof Enable, &Enable);
+    return putItem(NvKey(KVI_NVKEY_EVENT_LOG_ST_PREFIX, IsDaemonSave, DomainId, ResourceId),
+                   "Storing event log state in Non-Vol. memory", sizeof Enable, &Enable);
 }
 
 KVI_EXPORT SaErrorT kviCsGetEvtLogStNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
@@ -117,10 +132,8 @@ KVI_EXPORT SaErrorT kviCsGetEvtLogStNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(Enable);
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RPT(key, KVI_NVKEY_EVENT_LOG_ST_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId);
-    return getWhole(key, IsDaemonSave, sizeof *Enable, Enable);
+    return getWhole(NvKey(KVI_NVKEY_EVENT_LOG_ST_PREFIX, IsDaemonSave, DomainId, ResourceId),
+                    IsDaemonSave, sizeof *Enable, Enable);
 }
 
 KVI_EXPORT SaErrorT kviCsSaveResTagNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
@@ -129,11 +142,9 @@ KVI_EXPORT SaErrorT kviCsSaveResTagNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT 
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(ResourceTag);
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RPT(key, KVI_NVKEY_RESOURCE_TAG_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId);
-    KVI_DLOG(KVI_LOG_DBG_L, "Storing resource tag in Non-Vol. memory");
-    return putItem(key, TEXT_BUFFER_HEADER + ResourceTag->DataLength, ResourceTag);
+    return putItem(NvKey(KVI_NVKEY_RESOURCE_TAG_PREFIX, IsDaemonSave, DomainId, ResourceId),
+                   "Storing resource tag in Non-Vol. memory",
+                   TEXT_BUFFER_HEADER + ResourceTag->DataLength, ResourceTag);
 }
 
 SaErrorT kviCsReadResTagNV(const char *Key, bool LogMissing, SaHpiUint32T MismatchLevel,
@@ -161,10 +172,8 @@ KVI_EXPORT SaErrorT kviCsGetResTagNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT R
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(ResourceTag);
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RPT(key, KVI_NVKEY_RESOURCE_TAG_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId);
-    return kviCsReadResTagNV(key, !IsDaemonSave, KVI_LOG_ERR_NONFATAL_NUM, ResourceTag);
+    NvKey key(KVI_NVKEY_RESOURCE_TAG_PREFIX, IsDaemonSave, DomainId, ResourceId);
+    return kviCsReadResTagNV(key.Text, !IsDaemonSave, KVI_LOG_ERR_NONFATAL_NUM, ResourceTag);
 }
 
 KVI_EXPORT SaErrorT kviCsSaveResSeverityNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
@@ -173,11 +182,8 @@ KVI_EXPORT SaErrorT kviCsSaveResSeverityNV(SaHpiDomainIdT DomainId, SaHpiResourc
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(Severity);
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RPT(key, KVI_NVKEY_RESOURCE_SEVERITY_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId);
-    KVI_DLOG(KVI_LOG_DBG_L, "Storing resource severity in Non-Vol. memory");
-    return putItem(key, sizeof *Severity, Severity);
+    return putItem(NvKey(KVI_NVKEY_RESOURCE_SEVERITY_PREFIX, IsDaemonSave, DomainId, ResourceId),
+                   "Storing resource severity in Non-Vol. memory", sizeof *Severity, Severity);
 }
 
 KVI_EXPORT SaErrorT kviCsGetResSeverityNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
@@ -186,10 +192,8 @@ KVI_EXPORT SaErrorT kviCsGetResSeverityNV(SaHpiDomainIdT DomainId, SaHpiResource
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(Severity);
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RPT(key, KVI_NVKEY_RESOURCE_SEVERITY_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId);
-    return getWhole(key, IsDaemonSave, sizeof *Severity, Severity);
+    return getWhole(NvKey(KVI_NVKEY_RESOURCE_SEVERITY_PREFIX, IsDaemonSave, DomainId, ResourceId),
+                    IsDaemonSave, sizeof *Severity, Severity);
 }
 
 // ---------------------------------------------------------------------------
@@ -201,11 +205,9 @@ KVI_EXPORT SaErrorT kviCsSaveThreshNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT 
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(SensorThresholds);
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RDR(key, KVI_NVKEY_SENSOR_THRESH_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId, SensorNum);
-    KVI_DLOG(KVI_LOG_DBG_L, "Storing Sensor Thresholds in Non-Vol. memory");
-    return putItem(key, sizeof *SensorThresholds, SensorThresholds);
+    return putItem(
+        NvKey(KVI_NVKEY_SENSOR_THRESH_PREFIX, IsDaemonSave, DomainId, ResourceId, SensorNum),
+        "Storing Sensor Thresholds in Non-Vol. memory", sizeof *SensorThresholds, SensorThresholds);
 }
 
 KVI_EXPORT SaErrorT kviCsGetThreshNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
@@ -214,10 +216,9 @@ KVI_EXPORT SaErrorT kviCsGetThreshNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT R
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(SensorThresholds);
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RDR(key, KVI_NVKEY_SENSOR_THRESH_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId, SensorNum);
-    return getWhole(key, IsDaemonSave, sizeof *SensorThresholds, SensorThresholds);
+    return getWhole(
+        NvKey(KVI_NVKEY_SENSOR_THRESH_PREFIX, IsDaemonSave, DomainId, ResourceId, SensorNum),
+        IsDaemonSave, sizeof *SensorThresholds, SensorThresholds);
 }
 
 KVI_EXPORT SaErrorT kviCsSaveEvtEnablesNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
@@ -226,11 +227,9 @@ KVI_EXPORT SaErrorT kviCsSaveEvtEnablesNV(SaHpiDomainIdT DomainId, SaHpiResource
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(Enables);
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RDR(key, KVI_NVKEY_EVENT_ENABLE_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId, SensorNum);
-    KVI_DLOG(KVI_LOG_DBG_L, "Storing event enables in Non-Vol. memory");
-    return putItem(key, sizeof *Enables, Enables);
+    return putItem(
+        NvKey(KVI_NVKEY_EVENT_ENABLE_PREFIX, IsDaemonSave, DomainId, ResourceId, SensorNum),
+        "Storing event enables in Non-Vol. memory", sizeof *Enables, Enables);
 }
 
 KVI_EXPORT SaErrorT kviCsGetEvtEnablesNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
@@ -239,10 +238,9 @@ KVI_EXPORT SaErrorT kviCsGetEvtEnablesNV(SaHpiDomainIdT DomainId, SaHpiResourceI
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(Enables);
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RDR(key, KVI_NVKEY_EVENT_ENABLE_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId, SensorNum);
-    return getWhole(key, IsDaemonSave, sizeof *Enables, Enables);
+    return getWhole(
+        NvKey(KVI_NVKEY_EVENT_ENABLE_PREFIX, IsDaemonSave, DomainId, ResourceId, SensorNum),
+        IsDaemonSave, sizeof *Enables, Enables);
 }
 
 // ---------------------------------------------------------------------------
@@ -254,11 +252,9 @@ KVI_EXPORT SaErrorT kviCsSaveCtrlStateNV(SaHpiDomainIdT DomainId, SaHpiResourceI
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(CtrlState);
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RDR(key, KVI_NVKEY_CONTROL_STATE_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId, CtrlNum);
-    KVI_DLOG(KVI_LOG_DBG_L, "Storing control state in Non-Vol. memory");
-    return putItem(key, ctrlStateLength(CtrlState), CtrlState);
+    return putItem(
+        NvKey(KVI_NVKEY_CONTROL_STATE_PREFIX, IsDaemonSave, DomainId, ResourceId, CtrlNum),
+        "Storing control state in Non-Vol. memory", ctrlStateLength(CtrlState), CtrlState);
 }
 
 KVI_EXPORT SaErrorT kviCsGetCtrlStateNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
@@ -267,12 +263,10 @@ KVI_EXPORT SaErrorT kviCsGetCtrlStateNV(SaHpiDomainIdT DomainId, SaHpiResourceId
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(CtrlState);
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RDR(key, KVI_NVKEY_CONTROL_STATE_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId, CtrlNum);
+    NvKey key(KVI_NVKEY_CONTROL_STATE_PREFIX, IsDaemonSave, DomainId, ResourceId, CtrlNum);
     memset(CtrlState, 0, sizeof *CtrlState);
     SaHpiUint32T bytesRead = 0;
-    SaErrorT rc = getItem(key, IsDaemonSave, sizeof *CtrlState, CtrlState, &bytesRead, true);
+    SaErrorT rc = getItem(key.Text, IsDaemonSave, sizeof *CtrlState, CtrlState, &bytesRead, true);
     if (rc != SA_ERR_HPI_DATA_TRUNCATED)
         return rc;
     if (!shortCtrlStateIsSound(CtrlState, bytesRead)) {
@@ -292,9 +286,7 @@ KVI_EXPORT SaErrorT kviCsSaveFruNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT Res
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(FruBuffer);
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RDR(key, KVI_NVKEY_SAVE_FRU_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId, EirId);
+    NvKey key(KVI_NVKEY_SAVE_FRU_PREFIX, IsDaemonSave, DomainId, ResourceId, EirId);
     SaHpiUint32T size = FruSize & FRU_SIZE_MASK;
     auto *object = static_cast<SaHpiUint8T *>(KVI_CS_MALLOC(size + FRU_EXTRA));
     if (object == nullptr) {
@@ -304,8 +296,7 @@ KVI_EXPORT SaErrorT kviCsSaveFruNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT Res
     memset(object, 0, size + FRU_EXTRA);
     memcpy(object, &size, FRU_LENGTH_WORD);
     memcpy(object + FRU_LENGTH_WORD, FruBuffer, size);
-    KVI_DLOG(KVI_LOG_DBG_L, "Storing FRU in Non-Vol. memory");
-    SaErrorT rc = putItem(key, size + FRU_EXTRA, object);
+    SaErrorT rc = putItem(key, "Storing FRU in Non-Vol. memory", size + FRU_EXTRA, object);
     KVI_CS_FREE(object);
     return rc;
 }
@@ -316,10 +307,8 @@ KVI_EXPORT SaErrorT kviCsGetFruSizeNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT 
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(FruSize);
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RDR(key, KVI_NVKEY_SAVE_FRU_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId, EirId);
-    return getWhole(key, IsDaemonSave, FRU_LENGTH_WORD, FruSize);
+    return getWhole(NvKey(KVI_NVKEY_SAVE_FRU_PREFIX, IsDaemonSave, DomainId, ResourceId, EirId),
+                    IsDaemonSave, FRU_LENGTH_WORD, FruSize);
 }
 
 KVI_EXPORT SaErrorT kviCsGetFruNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
@@ -328,9 +317,7 @@ KVI_EXPORT SaErrorT kviCsGetFruNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT Reso
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(FruBuffer);
-    char key[KVI_MAX_NV_KEY_LENGTH];
-    KVI_CREATE_NV_PARMCTRL_KEY_RDR(key, KVI_NVKEY_SAVE_FRU_PREFIX, IsDaemonSave, DomainId,
-                                   ResourceId, EirId);
+    NvKey key(KVI_NVKEY_SAVE_FRU_PREFIX, IsDaemonSave, DomainId, ResourceId, EirId);
     // The object is read whole from its start, length word first, so that
     // the word and the data come from the same file.
     SaHpiUint32T room = FruSize < FRU_SIZE_MASK ? FruSize : FRU_SIZE_MASK;
@@ -340,7 +327,7 @@ KVI_EXPORT SaErrorT kviCsGetFruNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT Reso
         return SA_ERR_HPI_OUT_OF_SPACE;
     }
     SaHpiUint32T bytesRead = 0;
-    SaErrorT rc = getItem(key, IsDaemonSave, room + FRU_LENGTH_WORD, object, &bytesRead, true);
+    SaErrorT rc = getItem(key.Text, IsDaemonSave, room + FRU_LENGTH_WORD, object, &bytesRead, true);
     if (rc == SA_OK || rc == SA_ERR_HPI_DATA_TRUNCATED)
         rc = copyFru(object, bytesRead, room, FruBuffer);
     KVI_CS_FREE(object);
