@@ -16,109 +16,47 @@
 
 #define C_PLUGIN_TAG "C plug-in"
 
+/* A slot answering Result. Its parameters after the domain and resource ids
+ * every slot starts with are written out in full, so the tables below only
+ * compile while each slot keeps the contract's exact type. */
+#define SLOT(Name, Result, ...)                                                                    \
+    static SaErrorT Name(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId, __VA_ARGS__)        \
+    {                                                                                              \
+        return Result;                                                                             \
+    }
+#define REFUSED SA_ERR_HPI_INVALID_CMD
+
 static SaHpiUint32T maplNum;
 static SaHpiResourceIdT resourceId;
 
 /* ---- Resource slots ---- */
 
-static SaErrorT eventLogInfoGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                void *UserDefined, SaHpiSelInfoT *Info)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT eventLogEntryGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                 SaHpiSelEntryIdT EntryId, void *UserDefined,
-                                 SaHpiSelEntryIdT *PrevEntryId, SaHpiSelEntryIdT *NextEntryId,
-                                 SaHpiSelEntryT *EventLogEntry, SaHpiRdrT *Rdr,
-                                 SaHpiRptEntryT *RptEntry)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT eventLogEntryAdd(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                 SaHpiSelEntryT *EvtEntry, void *UserDefined)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT eventLogEntryDelete(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                    SaHpiSelEntryIdT EntryId, void *UserDefined)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT eventLogClear(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                              void *UserDefined)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT eventLogTimeGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                void *UserDefined, SaHpiTimeT *Time)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT eventLogTimeSet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                SaHpiTimeT Time, void *UserDefined)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT eventLogStateGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                 void *UserDefined, SaHpiBoolT *Enable)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT eventLogStateSet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                 SaHpiBoolT Enable, void *UserDefined)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT hotSwapControlRequest(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                      void *UserDefined)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT resourceActiveSet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                  void *UserDefined)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT resourceInactiveSet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                    void *UserDefined)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT autoExtractTimeoutGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                      void *UserDefined, SaHpiTimeoutT *Timeout)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT autoExtractTimeoutSet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                      SaHpiTimeoutT Timeout, void *UserDefined)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT hotSwapStateGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                void *UserDefined, SaHpiHsStateT *State)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT hotSwapActionRequest(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                     SaHpiHsActionT Action, void *UserDefined)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
+SLOT(eventLogInfoGet, REFUSED, void *UserDefined, SaHpiSelInfoT *Info)
+SLOT(eventLogEntryGet, REFUSED, SaHpiSelEntryIdT EntryId, void *UserDefined,
+     SaHpiSelEntryIdT *PrevEntryId, SaHpiSelEntryIdT *NextEntryId, SaHpiSelEntryT *EventLogEntry,
+     SaHpiRdrT *Rdr, SaHpiRptEntryT *RptEntry)
+SLOT(eventLogEntryAdd, REFUSED, SaHpiSelEntryT *EvtEntry, void *UserDefined)
+SLOT(eventLogEntryDelete, REFUSED, SaHpiSelEntryIdT EntryId, void *UserDefined)
+SLOT(eventLogClear, REFUSED, void *UserDefined)
+SLOT(eventLogTimeGet, REFUSED, void *UserDefined, SaHpiTimeT *Time)
+SLOT(eventLogTimeSet, REFUSED, SaHpiTimeT Time, void *UserDefined)
+SLOT(eventLogStateGet, REFUSED, void *UserDefined, SaHpiBoolT *Enable)
+SLOT(eventLogStateSet, REFUSED, SaHpiBoolT Enable, void *UserDefined)
+SLOT(hotSwapControlRequest, REFUSED, void *UserDefined)
+SLOT(resourceActiveSet, REFUSED, void *UserDefined)
+SLOT(resourceInactiveSet, REFUSED, void *UserDefined)
+SLOT(autoExtractTimeoutGet, REFUSED, void *UserDefined, SaHpiTimeoutT *Timeout)
+SLOT(autoExtractTimeoutSet, REFUSED, SaHpiTimeoutT Timeout, void *UserDefined)
+SLOT(hotSwapStateGet, REFUSED, void *UserDefined, SaHpiHsStateT *State)
+SLOT(hotSwapActionRequest, REFUSED, SaHpiHsActionT Action, void *UserDefined)
+SLOT(resourcePowerStateSet, REFUSED, SaHpiHsPowerStateT State, void *UserDefined)
+SLOT(hotSwapIndicatorStateGet, REFUSED, void *UserDefined, SaHpiHsIndicatorStateT *State)
+SLOT(hotSwapIndicatorStateSet, REFUSED, SaHpiHsIndicatorStateT State, void *UserDefined)
+SLOT(resourceResetStateGet, REFUSED, void *UserDefined, SaHpiResetActionT *ResetAction)
+SLOT(resourceResetStateSet, REFUSED, SaHpiResetActionT ResetAction, void *UserDefined)
+SLOT(rptSaveParmControl, SA_OK, KviDsRptFnTable *FnTable, void *UserDefined)
+SLOT(rptRestoreParmControl, SA_OK, KviDsRptFnTable *FnTable, void *UserDefined,
+     SaHpiBoolT IsDaemonRestore)
 
 static SaErrorT resourcePowerStateGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                       void *UserDefined, SaHpiHsPowerStateT *State)
@@ -127,223 +65,63 @@ static SaErrorT resourcePowerStateGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT 
     return SA_OK;
 }
 
-static SaErrorT resourcePowerStateSet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                      SaHpiHsPowerStateT State, void *UserDefined)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT hotSwapIndicatorStateGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                         void *UserDefined, SaHpiHsIndicatorStateT *State)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT hotSwapIndicatorStateSet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                         SaHpiHsIndicatorStateT State, void *UserDefined)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT resourceResetStateGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                      void *UserDefined, SaHpiResetActionT *ResetAction)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT resourceResetStateSet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                      SaHpiResetActionT ResetAction, void *UserDefined)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
 static SaErrorT rptDefaultParmControl(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId)
 {
     return SA_OK;
 }
 
-static SaErrorT rptSaveParmControl(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                   KviDsRptFnTable *FnTable, void *UserDefined)
-{
-    return SA_OK;
-}
-
-static SaErrorT rptRestoreParmControl(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                      KviDsRptFnTable *FnTable, void *UserDefined,
-                                      SaHpiBoolT IsDaemonRestore)
-{
-    return SA_OK;
-}
-
+/* In the contract's order. */
+/* clang-format off */
 static KviDsRptFnTable rptTable = {
-    eventLogInfoGet,
-    eventLogEntryGet,
-    eventLogEntryAdd,
-    eventLogEntryDelete,
-    eventLogClear,
-    eventLogTimeGet,
-    eventLogTimeSet,
-    eventLogStateGet,
-    eventLogStateSet,
-    hotSwapControlRequest,
-    resourceActiveSet,
-    resourceInactiveSet,
-    autoExtractTimeoutGet,
-    autoExtractTimeoutSet,
-    hotSwapStateGet,
-    hotSwapActionRequest,
-    resourcePowerStateGet,
-    resourcePowerStateSet,
-    hotSwapIndicatorStateGet,
-    hotSwapIndicatorStateSet,
-    resourceResetStateGet,
-    resourceResetStateSet,
-    kviDsDefaultRptResourcesRemove,
-    rptDefaultParmControl,
-    rptSaveParmControl,
-    rptRestoreParmControl,
+    eventLogInfoGet, eventLogEntryGet, eventLogEntryAdd, eventLogEntryDelete, eventLogClear,
+    eventLogTimeGet, eventLogTimeSet, eventLogStateGet, eventLogStateSet, hotSwapControlRequest,
+    resourceActiveSet, resourceInactiveSet, autoExtractTimeoutGet, autoExtractTimeoutSet,
+    hotSwapStateGet, hotSwapActionRequest, resourcePowerStateGet, resourcePowerStateSet,
+    hotSwapIndicatorStateGet, hotSwapIndicatorStateSet, resourceResetStateGet,
+    resourceResetStateSet, kviDsDefaultRptResourcesRemove, rptDefaultParmControl,
+    rptSaveParmControl, rptRestoreParmControl,
 };
+/* clang-format on */
 
 /* ---- Record slots ---- */
 
-static SaErrorT sensorReadingGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                 SaHpiSensorNumT SensorNum, SaHpiEventCategoryT Category,
-                                 SaHpiRdrT *Rdr, void *UserData, SaHpiSensorReadingT *Reading)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
+SLOT(sensorReadingGet, REFUSED, SaHpiSensorNumT SensorNum, SaHpiEventCategoryT Category,
+     SaHpiRdrT *Rdr, void *UserData, SaHpiSensorReadingT *Reading)
+SLOT(sensorReadingConvert, REFUSED, SaHpiSensorNumT SensorNum, SaHpiRdrT *Rdr,
+     SaHpiSensorReadingT *ReadingInput, void *UserData, SaHpiSensorReadingT *ConvertedReading)
+SLOT(sensorThresholdsGet, REFUSED, SaHpiSensorNumT SensorNum, SaHpiRdrT *Rdr, void *UserData,
+     SaHpiSensorThresholdsT *SensorThresholds)
+SLOT(sensorThresholdsSet, REFUSED, SaHpiSensorNumT SensorNum, SaHpiRdrT *Rdr,
+     SaHpiSensorThresholdsT *SensorThresholds, void *UserData)
+SLOT(sensorEventEnablesGet, REFUSED, SaHpiSensorNumT SensorNum, void *UserData,
+     SaHpiCapabilitiesT Capabilities, SaHpiEventCategoryT Category, SaHpiSensorEvtEnablesT *Enables)
+SLOT(sensorEventEnablesSet, REFUSED, SaHpiSensorNumT SensorNum, SaHpiSensorEvtEnablesT *Enables,
+     SaHpiRdrT *Rdr, SaHpiCapabilitiesT Capabilities, void *UserData)
+SLOT(controlStateGet, REFUSED, SaHpiCtrlNumT CtrlNum, void *UserData, SaHpiCtrlStateT *CtrlState)
+SLOT(controlStateSet, REFUSED, SaHpiCtrlNumT CtrlNum, SaHpiCtrlStateT *CtrlState, void *UserData)
+SLOT(watchdogTimerGet, REFUSED, SaHpiWatchdogNumT WatchdogNum, void *UserData,
+     SaHpiWatchdogT *Watchdog)
+SLOT(watchdogTimerSet, REFUSED, SaHpiWatchdogNumT WatchdogNum, SaHpiWatchdogT *Watchdog,
+     void *UserData)
+SLOT(watchdogTimerReset, REFUSED, SaHpiWatchdogNumT WatchdogNum, void *UserData)
+SLOT(entityInventoryDataRead, REFUSED, SaHpiEirIdT EirId, SaHpiUint32T BufferSize, void *UserData,
+     SaHpiInventoryDataT *InventData, SaHpiUint32T *ActualSize)
+SLOT(entityInventoryDataWrite, REFUSED, SaHpiEirIdT EirId, SaHpiInventoryDataT *InventData,
+     void *UserData)
+SLOT(activeAlarmTranslate, REFUSED, SaHpiSensorNumT SensorNum, void *UserData, SaHpiRdrT *Rdr,
+     SaHpiRptEntryT *RptEntry, SaHpiEventT *Event)
+SLOT(rdrDefaultParmControl, SA_OK, SaHpiRdrT *Rdr, KviDsRdrFnTable *FnTable, void *UserData)
+SLOT(rdrSaveParmControl, SA_OK, SaHpiRdrT *Rdr, KviDsRdrFnTable *FnTable, void *UserData)
+SLOT(rdrRestoreParmControl, SA_OK, SaHpiBoolT IsDaemonRestore, SaHpiRdrT *Rdr,
+     KviDsRdrFnTable *FnTable, void *UserData)
 
-static SaErrorT sensorReadingConvert(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                     SaHpiSensorNumT SensorNum, SaHpiRdrT *Rdr,
-                                     SaHpiSensorReadingT *ReadingInput, void *UserData,
-                                     SaHpiSensorReadingT *ConvertedReading)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT sensorThresholdsGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                    SaHpiSensorNumT SensorNum, SaHpiRdrT *Rdr, void *UserData,
-                                    SaHpiSensorThresholdsT *SensorThresholds)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT sensorThresholdsSet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                    SaHpiSensorNumT SensorNum, SaHpiRdrT *Rdr,
-                                    SaHpiSensorThresholdsT *SensorThresholds, void *UserData)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT sensorEventEnablesGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                      SaHpiSensorNumT SensorNum, void *UserData,
-                                      SaHpiCapabilitiesT Capabilities, SaHpiEventCategoryT Category,
-                                      SaHpiSensorEvtEnablesT *Enables)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT sensorEventEnablesSet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                      SaHpiSensorNumT SensorNum, SaHpiSensorEvtEnablesT *Enables,
-                                      SaHpiRdrT *Rdr, SaHpiCapabilitiesT Capabilities,
-                                      void *UserData)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT controlStateGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                SaHpiCtrlNumT CtrlNum, void *UserData, SaHpiCtrlStateT *CtrlState)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT controlStateSet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                SaHpiCtrlNumT CtrlNum, SaHpiCtrlStateT *CtrlState, void *UserData)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT watchdogTimerGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                 SaHpiWatchdogNumT WatchdogNum, void *UserData,
-                                 SaHpiWatchdogT *Watchdog)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT watchdogTimerSet(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                 SaHpiWatchdogNumT WatchdogNum, SaHpiWatchdogT *Watchdog,
-                                 void *UserData)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT watchdogTimerReset(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                   SaHpiWatchdogNumT WatchdogNum, void *UserData)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT entityInventoryDataRead(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                        SaHpiEirIdT EirId, SaHpiUint32T BufferSize, void *UserData,
-                                        SaHpiInventoryDataT *InventData, SaHpiUint32T *ActualSize)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT entityInventoryDataWrite(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                         SaHpiEirIdT EirId, SaHpiInventoryDataT *InventData,
-                                         void *UserData)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT activeAlarmTranslate(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                     SaHpiSensorNumT SensorNum, void *UserData, SaHpiRdrT *Rdr,
-                                     SaHpiRptEntryT *RptEntry, SaHpiEventT *Event)
-{
-    return SA_ERR_HPI_INVALID_CMD;
-}
-
-static SaErrorT rdrDefaultParmControl(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                      SaHpiRdrT *Rdr, KviDsRdrFnTable *FnTable, void *UserData)
-{
-    return SA_OK;
-}
-
-static SaErrorT rdrSaveParmControl(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                   SaHpiRdrT *Rdr, KviDsRdrFnTable *FnTable, void *UserData)
-{
-    return SA_OK;
-}
-
-static SaErrorT rdrRestoreParmControl(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
-                                      SaHpiBoolT IsDaemonRestore, SaHpiRdrT *Rdr,
-                                      KviDsRdrFnTable *FnTable, void *UserData)
-{
-    return SA_OK;
-}
-
-/* One slot a line, in the contract's order. */
 /* clang-format off */
 static KviDsRdrFnTable rdrTable = {
-    sensorReadingGet,
-    sensorReadingConvert,
-    sensorThresholdsGet,
-    sensorThresholdsSet,
-    sensorEventEnablesGet,
-    sensorEventEnablesSet,
-    controlStateGet,
-    controlStateSet,
-    watchdogTimerGet,
-    watchdogTimerSet,
-    watchdogTimerReset,
-    entityInventoryDataRead,
-    entityInventoryDataWrite,
-    activeAlarmTranslate,
-    kviDsDefaultRdrResourcesRemove,
-    rdrDefaultParmControl,
-    rdrSaveParmControl,
-    rdrRestoreParmControl,
+    sensorReadingGet, sensorReadingConvert, sensorThresholdsGet, sensorThresholdsSet,
+    sensorEventEnablesGet, sensorEventEnablesSet, controlStateGet, controlStateSet,
+    watchdogTimerGet, watchdogTimerSet, watchdogTimerReset, entityInventoryDataRead,
+    entityInventoryDataWrite, activeAlarmTranslate, kviDsDefaultRdrResourcesRemove,
+    rdrDefaultParmControl, rdrSaveParmControl, rdrRestoreParmControl,
 };
 /* clang-format on */
 
