@@ -12,12 +12,6 @@ constexpr SaHpiTextTypeT TEXT_TYPE = SAHPI_TL_TYPE_LANGUAGE;
 constexpr SaHpiLanguageT TEXT_LANGUAGE = SAHPI_LANG_ENGLISH;
 constexpr SaHpiUint32T DISPLAY_SIZE = SIM_TEXT_LINES * SIM_TEXT_CHARS;
 
-SimRecordT *controlOf(void *UserData) noexcept
-{
-    auto *record = static_cast<SimRecordT *>(UserData);
-    return record != nullptr && record->Type == SAHPI_CTRL_RDR ? record : nullptr;
-}
-
 bool isAllLines(SaHpiTxtLineNumT Line) noexcept
 {
     return Line == 0 || Line == SAHPI_TLN_ALL_LINES;
@@ -180,11 +174,6 @@ void defaultState(const SimRecordT *Record, SaHpiCtrlStateT *State) noexcept
     }
 }
 
-bool affectsReadings(const SimControlShapeT *Shape) noexcept
-{
-    return Shape->Role != SIM_CTRL_PLAIN;
-}
-
 } // namespace
 
 // ---- Model ----
@@ -239,7 +228,6 @@ void simControlInitialize(SimRecordT *Record) noexcept
     SaHpiCtrlStateT initial;
     defaultState(Record, &initial);
     assign(&c, &initial);
-    c.HasSaved = SAHPI_FALSE;
 }
 
 const SimRecordT *simFindControl(const SimResourceT *Resource, SimControlRoleT Role) noexcept
@@ -253,78 +241,46 @@ const SimRecordT *simFindControl(const SimResourceT *Resource, SimControlRoleT R
     return nullptr;
 }
 
-SaErrorT simControlParm(SimRecordT *Record, SimParmT Action) noexcept
-{
-    SimControlStateT &c = Record->Control;
-    switch (Action) {
-    case SIM_PARM_DEFAULT: {
-        SaHpiCtrlStateT initial;
-        defaultState(Record, &initial);
-        assign(&c, &initial);
-        break;
-    }
-    case SIM_PARM_SAVE:
-        stateOf(&c, SAHPI_TLN_ALL_LINES, &c.Saved);
-        c.HasSaved = SAHPI_TRUE;
-        return SA_OK;
-    case SIM_PARM_RESTORE:
-        if (!c.HasSaved) {
-            return SA_ERR_HPI_INVALID_REQUEST;
-        }
-        assign(&c, &c.Saved);
-        break;
-    }
-    if (affectsReadings(c.Shape)) {
-        simSensorsEvaluate(Record->Resource);
-    }
-    return SA_OK;
-}
-
 // ---- Slots ----
 
 SaErrorT simControlStateGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiCtrlNumT, void *UserData,
                             SaHpiCtrlStateT *CtrlState) noexcept
 {
-    SimRecordT *record = controlOf(UserData);
-    if (record == nullptr || CtrlState == nullptr) {
+    if (CtrlState == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    SimLock lock(record->Resource);
-    if (record->Removed) {
-        return SA_ERR_HPI_NOT_PRESENT;
-    }
-    // For a text control the caller names the line it wants to read.
-    SaHpiTxtLineNumT line = simRaw(CtrlState->Type) == SAHPI_CTRL_TYPE_TEXT
-                                ? CtrlState->StateUnion.Text.Line
-                                : SAHPI_TLN_ALL_LINES;
-    return stateOf(&record->Control, line, CtrlState);
+    return simWithRecord(UserData, SAHPI_CTRL_RDR, [&](SimRecordT &R) {
+        // For a text control the caller names the line it wants to read.
+        SaHpiTxtLineNumT line = simRaw(CtrlState->Type) == SAHPI_CTRL_TYPE_TEXT
+                                    ? CtrlState->StateUnion.Text.Line
+                                    : SAHPI_TLN_ALL_LINES;
+        return stateOf(&R.Control, line, CtrlState);
+    });
 }
 
 SaErrorT simControlStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiCtrlNumT,
                             SaHpiCtrlStateT *CtrlState, void *UserData) noexcept
 {
-    SimRecordT *record = controlOf(UserData);
-    if (record == nullptr || CtrlState == nullptr) {
+    if (CtrlState == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    SimLock lock(record->Resource);
-    if (record->Removed) {
-        return SA_ERR_HPI_NOT_PRESENT;
-    }
-    SimControlStateT &c = record->Control;
-    SaErrorT rc = validate(&c, CtrlState);
-    if (rc != SA_OK) {
-        return rc;
-    }
-    if (c.Shape->Type == SAHPI_CTRL_TYPE_DIGITAL &&
-        (CtrlState->StateUnion.Digital == SAHPI_CTRL_STATE_PULSE_ON ||
-         CtrlState->StateUnion.Digital == SAHPI_CTRL_STATE_PULSE_OFF)) {
-        c.Pulses++; // a pulse returns to the state it started from
-    } else {
-        assign(&c, CtrlState);
-    }
-    if (affectsReadings(c.Shape)) {
-        simSensorsEvaluate(record->Resource);
-    }
-    return SA_OK;
+    return simWithRecord(UserData, SAHPI_CTRL_RDR, [&](SimRecordT &R) {
+        SimControlStateT &c = R.Control;
+        SaErrorT rc = validate(&c, CtrlState);
+        if (rc != SA_OK) {
+            return rc;
+        }
+        if (c.Shape->Type == SAHPI_CTRL_TYPE_DIGITAL &&
+            (CtrlState->StateUnion.Digital == SAHPI_CTRL_STATE_PULSE_ON ||
+             CtrlState->StateUnion.Digital == SAHPI_CTRL_STATE_PULSE_OFF)) {
+            c.Pulses++; // a pulse returns to the state it started from
+        } else {
+            assign(&c, CtrlState);
+        }
+        // Controls with a role act on the resource's readings.
+        if (c.Shape->Role != SIM_CTRL_PLAIN) {
+            simSensorsEvaluate(R.Resource);
+        }
+        return SA_OK;
+    });
 }

@@ -9,11 +9,6 @@
 namespace
 {
 
-SimResourceT *resourceOf(void *UserDefined) noexcept
-{
-    return static_cast<SimResourceT *>(UserDefined);
-}
-
 SaHpiTimeT logNow(const SimEventLogT &Log) noexcept
 {
     SaHpiTimeT now = simNow();
@@ -142,22 +137,20 @@ void simEventLogRelease(SimEventLogT *Log) noexcept
 SaErrorT simEventLogInfoGet(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined,
                             SaHpiSelInfoT *Info) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr || Info == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    const SimEventLogT &log = resource->Log;
-    memset(Info, 0, sizeof(*Info));
-    Info->Entries = log.Count;
-    Info->Size = log.Size;
-    Info->UpdateTimestamp = log.UpdateTimestamp;
-    Info->CurrentTime = logNow(log);
-    Info->Enabled = log.Enabled;
-    Info->OverflowFlag = log.OverflowFlag;
-    Info->OverflowAction = SAHPI_SEL_OVERFLOW_WRAP;
-    Info->DeleteEntrySupported = SAHPI_TRUE;
-    return SA_OK;
+    return simReadResource(UserDefined, Info, [](const SimResourceT &R) {
+        const SimEventLogT &log = R.Log;
+        SaHpiSelInfoT info;
+        memset(&info, 0, sizeof(info));
+        info.Entries = log.Count;
+        info.Size = log.Size;
+        info.UpdateTimestamp = log.UpdateTimestamp;
+        info.CurrentTime = logNow(log);
+        info.Enabled = log.Enabled;
+        info.OverflowFlag = log.OverflowFlag;
+        info.OverflowAction = SAHPI_SEL_OVERFLOW_WRAP;
+        info.DeleteEntrySupported = SAHPI_TRUE;
+        return info;
+    });
 }
 
 SaErrorT simEventLogEntryGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT, SaHpiSelEntryIdT EntryId,
@@ -165,23 +158,23 @@ SaErrorT simEventLogEntryGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT, SaHpiSel
                              SaHpiSelEntryIdT *NextEntryId, SaHpiSelEntryT *EventLogEntry,
                              SaHpiRdrT *Rdr, SaHpiRptEntryT *RptEntry) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr || PrevEntryId == nullptr || NextEntryId == nullptr ||
-        EventLogEntry == nullptr) {
+    if (PrevEntryId == nullptr || NextEntryId == nullptr || EventLogEntry == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
     SaHpiSelEntryT entry;
-    {
-        SimLock lock(resource);
-        const SimEventLogT &log = resource->Log;
+    SaErrorT rc = simWithResource(UserDefined, [&](SimResourceT &R) {
+        const SimEventLogT &log = R.Log;
         SaHpiUint32T i = 0;
-        SaErrorT rc = find(log, EntryId, &i);
-        if (rc != SA_OK) {
-            return rc;
+        SaErrorT found = find(log, EntryId, &i);
+        if (found == SA_OK) {
+            entry = log.Entries[i];
+            *PrevEntryId = i > 0 ? log.Entries[i - 1].EntryId : SAHPI_NO_MORE_ENTRIES;
+            *NextEntryId = i + 1 < log.Count ? log.Entries[i + 1].EntryId : SAHPI_NO_MORE_ENTRIES;
         }
-        entry = log.Entries[i];
-        *PrevEntryId = i > 0 ? log.Entries[i - 1].EntryId : SAHPI_NO_MORE_ENTRIES;
-        *NextEntryId = i + 1 < log.Count ? log.Entries[i + 1].EntryId : SAHPI_NO_MORE_ENTRIES;
+        return found;
+    });
+    if (rc != SA_OK) {
+        return rc;
     }
     *EventLogEntry = entry;
     describe(DomainId, &entry.Event, Rdr, RptEntry);
@@ -191,101 +184,79 @@ SaErrorT simEventLogEntryGet(SaHpiDomainIdT DomainId, SaHpiResourceIdT, SaHpiSel
 SaErrorT simEventLogEntryAdd(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSelEntryT *EvtEntry,
                              void *UserDefined) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr || EvtEntry == nullptr) {
+    if (EvtEntry == nullptr || UserDefined == nullptr || !validEvent(&EvtEntry->Event)) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    if (!validEvent(&EvtEntry->Event)) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
     // A client's entry is taken even while the log is disabled: disabling
     // stops the resource's own logging only.
-    return append(resource->Log, &EvtEntry->Event);
+    return simWithResource(UserDefined,
+                           [&](SimResourceT &R) { return append(R.Log, &EvtEntry->Event); });
 }
 
 SaErrorT simEventLogEntryDelete(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSelEntryIdT EntryId,
                                 void *UserDefined) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    SimEventLogT &log = resource->Log;
-    SaHpiUint32T i = 0;
-    SaErrorT rc = find(log, EntryId, &i);
-    if (rc != SA_OK) {
-        return rc;
-    }
-    memmove(log.Entries + i, log.Entries + i + 1, (log.Count - i - 1) * sizeof(SaHpiSelEntryT));
-    log.Count--;
-    log.UpdateTimestamp = logNow(log);
-    return SA_OK;
+    return simWithResource(UserDefined, [&](SimResourceT &R) {
+        SimEventLogT &log = R.Log;
+        SaHpiUint32T i = 0;
+        SaErrorT rc = find(log, EntryId, &i);
+        if (rc != SA_OK) {
+            return rc;
+        }
+        memmove(log.Entries + i, log.Entries + i + 1, (log.Count - i - 1) * sizeof(SaHpiSelEntryT));
+        log.Count--;
+        log.UpdateTimestamp = logNow(log);
+        return SA_OK;
+    });
 }
 
 SaErrorT simEventLogClear(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    SimEventLogT &log = resource->Log;
-    log.Count = 0;
-    log.OverflowFlag = SAHPI_FALSE;
-    log.UpdateTimestamp = logNow(log);
-    return SA_OK;
+    return simWithResource(UserDefined, [](SimResourceT &R) {
+        R.Log.Count = 0;
+        R.Log.OverflowFlag = SAHPI_FALSE;
+        R.Log.UpdateTimestamp = logNow(R.Log);
+        return SA_OK;
+    });
 }
 
 SaErrorT simEventLogTimeGet(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined,
                             SaHpiTimeT *Time) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr || Time == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    *Time = logNow(resource->Log);
-    return SA_OK;
+    return simReadResource(UserDefined, Time, [](const SimResourceT &R) { return logNow(R.Log); });
 }
 
 SaErrorT simEventLogTimeSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiTimeT Time,
                             void *UserDefined) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr || Time == SAHPI_TIME_UNSPECIFIED) {
+    if (UserDefined == nullptr || Time == SAHPI_TIME_UNSPECIFIED) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
     SaHpiTimeT now = simNow();
     if (now == SAHPI_TIME_UNSPECIFIED) {
         return SA_ERR_HPI_ERROR;
     }
-    SimLock lock(resource);
-    resource->Log.Offset = Time - now;
-    return SA_OK;
+    return simWithResource(UserDefined, [&](SimResourceT &R) {
+        R.Log.Offset = Time - now;
+        return SA_OK;
+    });
 }
 
 SaErrorT simEventLogStateGet(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined,
                              SaHpiBoolT *Enable) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr || Enable == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    *Enable = resource->Log.Enabled;
-    return SA_OK;
+    return simReadResource(UserDefined, Enable,
+                           [](const SimResourceT &R) { return R.Log.Enabled; });
 }
 
 SaErrorT simEventLogStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiBoolT Enable,
                              void *UserDefined) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr || Enable > SAHPI_TRUE) {
+    if (Enable > SAHPI_TRUE) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    SimLock lock(resource);
-    resource->Log.Enabled = Enable;
-    return SA_OK;
+    return simWithResource(UserDefined, [&](SimResourceT &R) {
+        R.Log.Enabled = Enable;
+        return SA_OK;
+    });
 }

@@ -43,6 +43,13 @@ class BlobWriter
         SaHpiUint8T v = static_cast<SaHpiUint8T>(Value);
         put(&v, 1);
     }
+    // A run of bytes, after its length.
+    void bytes(const void *Data, SaHpiUint32T Length) noexcept
+    {
+        SaHpiUint16T n = static_cast<SaHpiUint16T>(Length);
+        put(&n, sizeof(n));
+        put(Data, n);
+    }
     void text(const SaHpiTextBufferT *Text) noexcept
     {
         u8(Text->DataType);
@@ -75,6 +82,18 @@ class BlobReader
         SaHpiUint8T v = 0;
         get(&v, 1);
         return v;
+    }
+    // A run of bytes into Out, which holds SIM_INVENTORY_CAPACITY; returns
+    // its length.
+    SaHpiUint32T bytes(SaHpiUint8T *Out) noexcept
+    {
+        SaHpiUint16T n = 0;
+        get(&n, sizeof(n));
+        if (n > SIM_INVENTORY_CAPACITY) {
+            n = SIM_INVENTORY_CAPACITY;
+        }
+        get(Out, n);
+        return n;
     }
     void text(SaHpiTextBufferT *Text) noexcept
     {
@@ -188,9 +207,7 @@ void buildDefault(const SimRecordT *Record, SimInventoryBlobT *Blob) noexcept
         putGeneral(w, BoardTexts, instance);
         w.u8(SAHPI_INVENT_RECTYPE_INTERNAL_USE);
         const SaHpiUint8T internal[4] = {0x01, 0x02, 0x03, 0x04};
-        SaHpiUint16T length = sizeof(internal);
-        w.put(&length, sizeof(length));
-        w.put(internal, sizeof(internal));
+        w.bytes(internal, sizeof(internal));
         break;
     }
     case SIM_FAN_TRAY:
@@ -206,9 +223,7 @@ void buildDefault(const SimRecordT *Record, SimInventoryBlobT *Blob) noexcept
         SaHpiManufacturerIdT mid = SIM_MANUFACTURER_ID;
         w.put(&mid, sizeof(mid));
         const SaHpiUint8T oem[2] = {0xA5, 0x5A};
-        SaHpiUint16T length = sizeof(oem);
-        w.put(&length, sizeof(length));
-        w.put(oem, sizeof(oem));
+        w.bytes(oem, sizeof(oem));
         break;
     }
     }
@@ -219,6 +234,8 @@ void buildDefault(const SimRecordT *Record, SimInventoryBlobT *Blob) noexcept
 constexpr size_t RECORD_DATA = offsetof(SaHpiInventDataRecordT, RecordData);
 constexpr size_t CUSTOM = offsetof(SaHpiInventGeneralDataT, CustomField);
 constexpr size_t CHASSIS_GENERAL = offsetof(SaHpiInventChassisDataT, GeneralData);
+constexpr size_t INTERNAL_DATA = offsetof(SaHpiInventInternalUseDataT, Data);
+constexpr size_t OEM_DATA = offsetof(SaHpiInventOemDataT, Data);
 
 SaHpiTextBufferT *placeText(Layout &L, BlobReader &R) noexcept
 {
@@ -301,11 +318,6 @@ SaHpiUint32T customCount(BlobReader R) noexcept
     return customs > MAX_CUSTOM ? MAX_CUSTOM : customs;
 }
 
-SaHpiUint16T clampLength(SaHpiUint16T Length) noexcept
-{
-    return Length > SIM_INVENTORY_CAPACITY ? SIM_INVENTORY_CAPACITY : Length;
-}
-
 SaHpiInventDataRecordT *takeRecord(Layout &L, size_t Size) noexcept
 {
     if (Size < sizeof(SaHpiInventDataRecordT)) {
@@ -315,6 +327,20 @@ SaHpiInventDataRecordT *takeRecord(Layout &L, size_t Size) noexcept
     if (record != nullptr) {
         memset(record, 0, Size);
     }
+    return record;
+}
+
+// A record whose data ends in a run of bytes Offset bytes into it; Length
+// is the record's data length.
+SaHpiInventDataRecordT *placeBytes(Layout &L, BlobReader &R, size_t Offset, size_t *Length) noexcept
+{
+    SaHpiUint8T bytes[SIM_INVENTORY_CAPACITY];
+    SaHpiUint32T n = R.bytes(bytes);
+    SaHpiInventDataRecordT *record = takeRecord(L, RECORD_DATA + Offset + n);
+    if (record != nullptr) {
+        memcpy(tail<SaHpiUint8T>(&record->RecordData, Offset), bytes, n);
+    }
+    *Length = Offset + n;
     return record;
 }
 
@@ -345,34 +371,16 @@ size_t layOut(const SimInventoryBlobT *Blob, void *Base, SaHpiUint32T Size) noex
         SaHpiInventDataRecordT *record = nullptr;
         size_t length = 0;
         switch (type) {
-        case SAHPI_INVENT_RECTYPE_INTERNAL_USE: {
-            SaHpiUint16T n = 0;
-            r.get(&n, sizeof(n));
-            n = clampLength(n);
-            record = takeRecord(l, RECORD_DATA + n);
-            SaHpiUint8T bytes[SIM_INVENTORY_CAPACITY];
-            r.get(bytes, n);
-            if (record != nullptr) {
-                memcpy(record->RecordData.InternalUse.Data, bytes, n);
-            }
-            length = n;
+        case SAHPI_INVENT_RECTYPE_INTERNAL_USE:
+            record = placeBytes(l, r, INTERNAL_DATA, &length);
             break;
-        }
         case SAHPI_INVENT_RECTYPE_OEM: {
             SaHpiManufacturerIdT mid = 0;
-            SaHpiUint16T n = 0;
             r.get(&mid, sizeof(mid));
-            r.get(&n, sizeof(n));
-            n = clampLength(n);
-            size_t offset = offsetof(SaHpiInventOemDataT, Data);
-            record = takeRecord(l, RECORD_DATA + offset + n);
-            SaHpiUint8T bytes[SIM_INVENTORY_CAPACITY];
-            r.get(bytes, n);
+            record = placeBytes(l, r, OEM_DATA, &length);
             if (record != nullptr) {
                 record->RecordData.OemData.MId = mid;
-                memcpy(tail<SaHpiUint8T>(&record->RecordData.OemData, offset), bytes, n);
             }
-            length = offset + n;
             break;
         }
         case SAHPI_INVENT_RECTYPE_CHASSIS_INFO: {
@@ -469,29 +477,23 @@ SaErrorT serialize(SaHpiInventoryDataT *Data, SimInventoryBlobT *Blob) noexcept
         SaHpiUint32T type = simRaw(record->RecordType);
         w.u8(type);
         switch (type) {
-        case SAHPI_INVENT_RECTYPE_INTERNAL_USE: {
+        case SAHPI_INVENT_RECTYPE_INTERNAL_USE:
             if (record->DataLength > SIM_INVENTORY_CAPACITY) {
                 return SA_ERR_HPI_OUT_OF_SPACE;
             }
-            SaHpiUint16T n = static_cast<SaHpiUint16T>(record->DataLength);
-            w.put(&n, sizeof(n));
-            w.put(record->RecordData.InternalUse.Data, n);
+            w.bytes(record->RecordData.InternalUse.Data, record->DataLength);
             break;
-        }
-        case SAHPI_INVENT_RECTYPE_OEM: {
-            size_t offset = offsetof(SaHpiInventOemDataT, Data);
-            if (record->DataLength < offset) {
+        case SAHPI_INVENT_RECTYPE_OEM:
+            if (record->DataLength < OEM_DATA) {
                 return SA_ERR_HPI_INVALID_PARAMS;
             }
-            if (record->DataLength - offset > SIM_INVENTORY_CAPACITY) {
+            if (record->DataLength - OEM_DATA > SIM_INVENTORY_CAPACITY) {
                 return SA_ERR_HPI_OUT_OF_SPACE;
             }
-            SaHpiUint16T n = static_cast<SaHpiUint16T>(record->DataLength - offset);
             w.put(&record->RecordData.OemData.MId, sizeof(SaHpiManufacturerIdT));
-            w.put(&n, sizeof(n));
-            w.put(tail<SaHpiUint8T>(&record->RecordData.OemData, offset), n);
+            w.bytes(tail<SaHpiUint8T>(&record->RecordData.OemData, OEM_DATA),
+                    static_cast<SaHpiUint32T>(record->DataLength - OEM_DATA));
             break;
-        }
         case SAHPI_INVENT_RECTYPE_CHASSIS_INFO:
             if (simRaw(record->RecordData.ChassisInfo.Type) < SAHPI_INVENT_CTYP_OTHER ||
                 simRaw(record->RecordData.ChassisInfo.Type) > SAHPI_INVENT_CTYP_RACKMOUNT) {
@@ -514,19 +516,12 @@ SaErrorT serialize(SaHpiInventoryDataT *Data, SimInventoryBlobT *Blob) noexcept
     return w.full() ? SA_ERR_HPI_OUT_OF_SPACE : SA_OK;
 }
 
-SimRecordT *inventoryOf(void *UserData) noexcept
-{
-    auto *record = static_cast<SimRecordT *>(UserData);
-    return record != nullptr && record->Type == SAHPI_INVENTORY_RDR ? record : nullptr;
-}
-
 } // namespace
 
 // ---- Model ----
 
 SaErrorT simInventoryInitialize(SimRecordT *Record) noexcept
 {
-    Record->Inventory.Saved = nullptr;
     Record->Inventory.Data =
         static_cast<SimInventoryBlobT *>(KVI_CS_MALLOC(sizeof(SimInventoryBlobT)));
     if (Record->Inventory.Data == nullptr) {
@@ -541,35 +536,11 @@ void simInventoryRelease(SimRecordT *Record) noexcept
     if (Record->Inventory.Data != nullptr) {
         KVI_CS_FREE(Record->Inventory.Data);
     }
-    if (Record->Inventory.Saved != nullptr) {
-        KVI_CS_FREE(Record->Inventory.Saved);
-    }
 }
 
-SaErrorT simInventoryParm(SimRecordT *Record, SimParmT Action) noexcept
+void simInventoryDefaults(SimRecordT *Record) noexcept
 {
-    SimInventoryStateT &inv = Record->Inventory;
-    switch (Action) {
-    case SIM_PARM_DEFAULT:
-        buildDefault(Record, inv.Data);
-        return SA_OK;
-    case SIM_PARM_SAVE:
-        if (inv.Saved == nullptr) {
-            inv.Saved = static_cast<SimInventoryBlobT *>(KVI_CS_MALLOC(sizeof(SimInventoryBlobT)));
-            if (inv.Saved == nullptr) {
-                return SA_ERR_HPI_OUT_OF_SPACE;
-            }
-        }
-        memcpy(inv.Saved, inv.Data, sizeof(SimInventoryBlobT));
-        return SA_OK;
-    case SIM_PARM_RESTORE:
-        if (inv.Saved == nullptr) {
-            return SA_ERR_HPI_INVALID_REQUEST;
-        }
-        memcpy(inv.Data, inv.Saved, sizeof(SimInventoryBlobT));
-        return SA_OK;
-    }
-    return SA_ERR_HPI_INVALID_PARAMS;
+    buildDefault(Record, Record->Inventory.Data);
 }
 
 // ---- Slots ----
@@ -579,33 +550,29 @@ SaErrorT simEntityInventoryDataRead(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiEirId
                                     SaHpiInventoryDataT *InventData,
                                     SaHpiUint32T *ActualSize) noexcept
 {
-    SimRecordT *record = inventoryOf(UserData);
-    if (record == nullptr || InventData == nullptr || ActualSize == nullptr) {
+    if (InventData == nullptr || ActualSize == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    SimLock lock(record->Resource);
-    if (record->Removed) {
-        return SA_ERR_HPI_NOT_PRESENT;
-    }
-    size_t needed = layOut(record->Inventory.Data, nullptr, 0);
-    *ActualSize = static_cast<SaHpiUint32T>(needed);
-    if (needed > BufferSize) {
-        // The caller learns the size it needs; what fits says the data overflowed.
-        if (BufferSize >= sizeof(SaHpiInventoryDataT)) {
-            memset(InventData, 0, sizeof(SaHpiInventoryDataT));
-            InventData->Validity = SAHPI_INVENT_DATA_OVERFLOW;
+    return simWithRecord(UserData, SAHPI_INVENTORY_RDR, [&](SimRecordT &R) {
+        size_t needed = layOut(R.Inventory.Data, nullptr, 0);
+        *ActualSize = static_cast<SaHpiUint32T>(needed);
+        if (needed > BufferSize) {
+            // The caller learns the size it needs; what fits says the data overflowed.
+            if (BufferSize >= sizeof(SaHpiInventoryDataT)) {
+                memset(InventData, 0, sizeof(SaHpiInventoryDataT));
+                InventData->Validity = SAHPI_INVENT_DATA_OVERFLOW;
+            }
+            return SA_ERR_HPI_DATA_LEN_INVALID;
         }
-        return SA_ERR_HPI_DATA_LEN_INVALID;
-    }
-    layOut(record->Inventory.Data, InventData, BufferSize);
-    return SA_OK;
+        layOut(R.Inventory.Data, InventData, BufferSize);
+        return SA_OK;
+    });
 }
 
 SaErrorT simEntityInventoryDataWrite(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiEirIdT,
                                      SaHpiInventoryDataT *InventData, void *UserData) noexcept
 {
-    SimRecordT *record = inventoryOf(UserData);
-    if (record == nullptr || InventData == nullptr) {
+    if (simRecordOf(UserData, SAHPI_INVENTORY_RDR) == nullptr || InventData == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
     auto *blob = static_cast<SimInventoryBlobT *>(KVI_CS_MALLOC(sizeof(SimInventoryBlobT)));
@@ -614,12 +581,10 @@ SaErrorT simEntityInventoryDataWrite(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiEirI
     }
     SaErrorT rc = serialize(InventData, blob);
     if (rc == SA_OK) {
-        SimLock lock(record->Resource);
-        if (record->Removed) {
-            rc = SA_ERR_HPI_NOT_PRESENT;
-        } else {
-            memcpy(record->Inventory.Data, blob, sizeof(SimInventoryBlobT));
-        }
+        rc = simWithRecord(UserData, SAHPI_INVENTORY_RDR, [&](SimRecordT &R) {
+            memcpy(R.Inventory.Data, blob, sizeof(SimInventoryBlobT));
+            return SA_OK;
+        });
     }
     KVI_CS_FREE(blob);
     return rc;

@@ -111,10 +111,6 @@ struct SimSensorStateT {
     SaHpiUint32T Raw[8]; // raw thresholds, order as in the shape
     SaHpiSensorEvtEnablesT Enables;
     SaHpiEventStateT State; // event state last evaluated
-    SaHpiBoolT HasSaved;
-    SaHpiBoolT SavedValid[8];
-    SaHpiUint32T SavedRaw[8];
-    SaHpiSensorEvtEnablesT SavedEnables;
 };
 
 struct SimControlStateT {
@@ -123,13 +119,10 @@ struct SimControlStateT {
     SaHpiUint8T Display[SIM_TEXT_LINES][SIM_TEXT_CHARS];
     SaHpiUint8T LineLength[SIM_TEXT_LINES];
     SaHpiUint32T Pulses; // digital pulses given
-    SaHpiBoolT HasSaved;
-    SaHpiCtrlStateT Saved; // text controls save all lines
 };
 
 struct SimInventoryStateT {
-    SimInventoryBlobT *Data;  // never NULL once discovered
-    SimInventoryBlobT *Saved; // NULL until a save
+    SimInventoryBlobT *Data; // never NULL once discovered
 };
 
 struct SimWatchdogStateT {
@@ -179,12 +172,6 @@ struct SimHotSwapT {
     SaHpiBoolT Managed; // a client asked to control hot swap
 };
 
-struct SimResourceParmsT { // what resource-level parameter control covers
-    SaHpiBoolT LogEnabled;
-    SaHpiTimeoutT AutoExtractTimeout;
-    SaHpiHsIndicatorStateT Indicator;
-};
-
 struct SimResourceT {
     pthread_mutex_t Mutex; // guards everything below and the records
     const SimResourceShapeT *Shape;
@@ -197,8 +184,6 @@ struct SimResourceT {
     SaHpiUint32T PowerCycles;
     SimHotSwapT HotSwap;
     SimEventLogT Log;
-    SaHpiBoolT HasSavedParms;
-    SimResourceParmsT SavedParms;
     SaHpiUint32T RecordCount;
     SimRecordT *Records; // in the same block, after this structure
 };
@@ -214,7 +199,9 @@ template <typename E> SaHpiUint32T simRaw(const E &Value) noexcept
     return raw;
 }
 
-// What parameter control asks of a record or resource.
+// What parameter control asks of a record. The library saves and restores
+// the resource's settings, its sensors' and its controls' itself, and puts
+// the controls' defaults back; the simulator does the rest.
 enum SimParmT { SIM_PARM_DEFAULT, SIM_PARM_SAVE, SIM_PARM_RESTORE };
 
 // ---- Plug-in wide services (Simulator.cpp) ----
@@ -231,6 +218,53 @@ class SimLock
   private:
     pthread_mutex_t *mutex_;
 };
+
+// The frames of the slots. A slot finds its resource or record in the pointer
+// the library stored with the entry and refuses a missing one (or a record of
+// another type); the body runs under the resource's mutex, and a record the
+// library has removed answers NOT_PRESENT.
+template <typename Body> SaErrorT simWithResource(void *UserDefined, Body body) noexcept
+{
+    auto *resource = static_cast<SimResourceT *>(UserDefined);
+    if (resource == nullptr) {
+        return SA_ERR_HPI_INVALID_PARAMS;
+    }
+    SimLock lock(resource);
+    return body(*resource);
+}
+
+// A getter of a resource: stores what Read picks out in Out.
+template <typename T, typename Read>
+SaErrorT simReadResource(void *UserDefined, T *Out, Read read) noexcept
+{
+    if (Out == nullptr) {
+        return SA_ERR_HPI_INVALID_PARAMS;
+    }
+    return simWithResource(UserDefined, [&](SimResourceT &R) {
+        *Out = read(R);
+        return SA_OK;
+    });
+}
+
+inline SimRecordT *simRecordOf(void *UserData, SaHpiRdrTypeT Type) noexcept
+{
+    auto *record = static_cast<SimRecordT *>(UserData);
+    return record != nullptr && record->Type == Type ? record : nullptr;
+}
+
+template <typename Body>
+SaErrorT simWithRecord(void *UserData, SaHpiRdrTypeT Type, Body body) noexcept
+{
+    SimRecordT *record = simRecordOf(UserData, Type);
+    if (record == nullptr) {
+        return SA_ERR_HPI_INVALID_PARAMS;
+    }
+    SimLock lock(record->Resource);
+    if (record->Removed) {
+        return SA_ERR_HPI_NOT_PRESENT;
+    }
+    return body(*record);
+}
 
 // The resource with that id. The pointer stays valid while the plug-in is
 // loaded and the resource is in the table, which a slot call guarantees.
@@ -265,18 +299,17 @@ void simSensorRecord(const SimRecordT *Record, SaHpiSensorRecT *Rec) noexcept;
 void simSensorInitialize(SimRecordT *Record) noexcept;
 // Re-evaluates every sensor of the resource and publishes the changes.
 void simSensorsEvaluate(SimResourceT *Resource) noexcept;
-SaErrorT simSensorParm(SimRecordT *Record, SimParmT Action) noexcept;
+void simSensorDefaults(SimRecordT *Record) noexcept;
 
 // Controls (SimControls.cpp)
 void simControlRecord(const SimRecordT *Record, SaHpiCtrlRecT *Rec) noexcept;
 void simControlInitialize(SimRecordT *Record) noexcept;
 const SimRecordT *simFindControl(const SimResourceT *Resource, SimControlRoleT Role) noexcept;
-SaErrorT simControlParm(SimRecordT *Record, SimParmT Action) noexcept;
 
 // Inventory (SimInventory.cpp)
 SaErrorT simInventoryInitialize(SimRecordT *Record) noexcept;
 void simInventoryRelease(SimRecordT *Record) noexcept;
-SaErrorT simInventoryParm(SimRecordT *Record, SimParmT Action) noexcept;
+void simInventoryDefaults(SimRecordT *Record) noexcept;
 
 // Watchdogs (SimWatchdog.cpp)
 void simWatchdogInitialize(SimRecordT *Record) noexcept;
@@ -321,10 +354,6 @@ SaErrorT simResourceResetStateGet(SaHpiDomainIdT, SaHpiResourceIdT, void *,
 SaErrorT simResourceResetStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiResetActionT,
                                   void *) noexcept;
 SaErrorT simRptDefaultParmControl(SaHpiDomainIdT, SaHpiResourceIdT) noexcept;
-SaErrorT simRptSaveParmControl(SaHpiDomainIdT, SaHpiResourceIdT, KviDsRptFnTable *,
-                               void *) noexcept;
-SaErrorT simRptRestoreParmControl(SaHpiDomainIdT, SaHpiResourceIdT, KviDsRptFnTable *, void *,
-                                  SaHpiBoolT) noexcept;
 
 // ---- Slots of the record table ----
 

@@ -1,6 +1,7 @@
-// Parameter control: default, save and restore of a resource's settings and
-// of each record's. Saved settings are kept in memory only, so they last as
-// long as the plug-in stays loaded.
+// Parameter control that is the simulator's own: the defaults of a resource,
+// its sensors, inventory and watchdogs, and the saved settings of its
+// watchdogs, which are kept in memory only and so last as long as the
+// plug-in stays loaded. The library keeps everything else in its store.
 #include "SimModel.h"
 
 namespace
@@ -8,15 +9,19 @@ namespace
 
 SaErrorT recordParm(SimRecordT *Record, SimParmT Action) noexcept
 {
+    if (Record->Type == SAHPI_WATCHDOG_RDR) {
+        return simWatchdogParm(Record, Action);
+    }
+    if (Action != SIM_PARM_DEFAULT) {
+        return SA_ERR_HPI_INVALID_PARAMS;
+    }
     switch (Record->Type) {
     case SAHPI_SENSOR_RDR:
-        return simSensorParm(Record, Action);
-    case SAHPI_CTRL_RDR:
-        return simControlParm(Record, Action);
+        simSensorDefaults(Record);
+        return SA_OK;
     case SAHPI_INVENTORY_RDR:
-        return simInventoryParm(Record, Action);
-    case SAHPI_WATCHDOG_RDR:
-        return simWatchdogParm(Record, Action);
+        simInventoryDefaults(Record);
+        return SA_OK;
     default:
         return SA_ERR_HPI_INVALID_PARAMS;
     }
@@ -28,22 +33,16 @@ SaErrorT recordSlot(void *UserData, SimParmT Action, SaHpiBoolT IsDaemonRestore)
     if (record == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    SimLock lock(record->Resource);
-    if (record->Removed) {
-        return SA_ERR_HPI_NOT_PRESENT;
-    }
-    SaErrorT rc = recordParm(record, Action);
-    // At daemon start nothing may have been saved yet, and that is no error.
-    if (rc == SA_ERR_HPI_INVALID_REQUEST && IsDaemonRestore) {
-        return SA_OK;
-    }
-    return rc;
+    return simWithRecord(record, record->Type, [&](SimRecordT &R) {
+        SaErrorT rc = recordParm(&R, Action);
+        // At daemon start nothing may have been saved yet, and that is no error.
+        return rc == SA_ERR_HPI_INVALID_REQUEST && IsDaemonRestore ? SA_OK : rc;
+    });
 }
 
 } // namespace
 
-// ---- Resource level: the event-log state and the hot-swap settings ----
-
+// The resource's own settings: the event-log state and the hot-swap ones.
 SaErrorT simRptDefaultParmControl(SaHpiDomainIdT, SaHpiResourceIdT ResourceId) noexcept
 {
     SimResourceT *resource = simFindResource(ResourceId);
@@ -54,40 +53,6 @@ SaErrorT simRptDefaultParmControl(SaHpiDomainIdT, SaHpiResourceIdT ResourceId) n
     simResourceDefaults(resource);
     return SA_OK;
 }
-
-SaErrorT simRptSaveParmControl(SaHpiDomainIdT, SaHpiResourceIdT, KviDsRptFnTable *,
-                               void *UserDefined) noexcept
-{
-    auto *resource = static_cast<SimResourceT *>(UserDefined);
-    if (resource == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    resource->SavedParms.LogEnabled = resource->Log.Enabled;
-    resource->SavedParms.AutoExtractTimeout = resource->HotSwap.AutoExtractTimeout;
-    resource->SavedParms.Indicator = resource->HotSwap.Indicator;
-    resource->HasSavedParms = SAHPI_TRUE;
-    return SA_OK;
-}
-
-SaErrorT simRptRestoreParmControl(SaHpiDomainIdT, SaHpiResourceIdT, KviDsRptFnTable *,
-                                  void *UserDefined, SaHpiBoolT IsDaemonRestore) noexcept
-{
-    auto *resource = static_cast<SimResourceT *>(UserDefined);
-    if (resource == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    if (!resource->HasSavedParms) {
-        return IsDaemonRestore ? SA_OK : SA_ERR_HPI_INVALID_REQUEST;
-    }
-    resource->Log.Enabled = resource->SavedParms.LogEnabled;
-    resource->HotSwap.AutoExtractTimeout = resource->SavedParms.AutoExtractTimeout;
-    resource->HotSwap.Indicator = resource->SavedParms.Indicator;
-    return SA_OK;
-}
-
-// ---- Record level ----
 
 SaErrorT simRdrDefaultParmControl(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRdrT *, KviDsRdrFnTable *,
                                   void *UserData) noexcept

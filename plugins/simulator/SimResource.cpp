@@ -9,9 +9,27 @@ namespace
 
 constexpr SaHpiTimeoutT AUTO_EXTRACT_TIMEOUT = 5000000000LL; // 5 s
 
-SimResourceT *resourceOf(void *UserDefined) noexcept
+void stopWatchdogs(SimResourceT &Resource) noexcept
 {
-    return static_cast<SimResourceT *>(UserDefined);
+    for (SaHpiUint32T i = 0; i < Resource.RecordCount; i++) {
+        if (Resource.Records[i].Type == SAHPI_WATCHDOG_RDR) {
+            simWatchdogStop(&Resource.Records[i]);
+        }
+    }
+}
+
+// A client managing hot swap completes a pending insertion or extraction.
+SaErrorT completePending(void *UserDefined, SaHpiHsStateT Target) noexcept
+{
+    return simWithResource(UserDefined, [&](SimResourceT &R) {
+        SimHotSwapT &hs = R.HotSwap;
+        if (!hs.Managed || (hs.State != SAHPI_HS_STATE_INSERTION_PENDING &&
+                            hs.State != SAHPI_HS_STATE_EXTRACTION_PENDING)) {
+            return SA_ERR_HPI_INVALID_REQUEST;
+        }
+        hs.State = Target;
+        return SA_OK;
+    });
 }
 
 } // namespace
@@ -53,95 +71,71 @@ void simResourceDefaults(SimResourceT *Resource) noexcept
 SaErrorT simResourcePowerStateGet(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined,
                                   SaHpiHsPowerStateT *State) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr || State == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    *State = resource->PowerState;
-    return SA_OK;
+    return simReadResource(UserDefined, State, [](const SimResourceT &R) { return R.PowerState; });
 }
 
 SaErrorT simResourcePowerStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiHsPowerStateT State,
                                   void *UserDefined) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    switch (simRaw(State)) {
-    case SAHPI_HS_POWER_OFF:
-    case SAHPI_HS_POWER_ON:
-        resource->PowerState = State;
-        break;
-    case SAHPI_HS_POWER_CYCLE:
-        // Off and on again: the resource ends up powered.
-        resource->PowerCycles++;
-        resource->PowerState = SAHPI_HS_POWER_ON;
-        break;
-    default:
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    if (resource->PowerState == SAHPI_HS_POWER_OFF) {
-        for (SaHpiUint32T i = 0; i < resource->RecordCount; i++) {
-            if (resource->Records[i].Type == SAHPI_WATCHDOG_RDR) {
-                simWatchdogStop(&resource->Records[i]);
-            }
+    return simWithResource(UserDefined, [&](SimResourceT &R) {
+        switch (simRaw(State)) {
+        case SAHPI_HS_POWER_OFF:
+        case SAHPI_HS_POWER_ON:
+            R.PowerState = State;
+            break;
+        case SAHPI_HS_POWER_CYCLE:
+            // Off and on again: the resource ends up powered.
+            R.PowerCycles++;
+            R.PowerState = SAHPI_HS_POWER_ON;
+            break;
+        default:
+            return SA_ERR_HPI_INVALID_PARAMS;
         }
-    }
-    simSensorsEvaluate(resource);
-    return SA_OK;
+        if (R.PowerState == SAHPI_HS_POWER_OFF) {
+            stopWatchdogs(R);
+        }
+        simSensorsEvaluate(&R);
+        return SA_OK;
+    });
 }
 
 SaErrorT simResourceResetStateGet(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined,
                                   SaHpiResetActionT *ResetAction) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr || ResetAction == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    *ResetAction = resource->ResetAsserted ? SAHPI_RESET_ASSERT : SAHPI_RESET_DEASSERT;
-    return SA_OK;
+    return simReadResource(UserDefined, ResetAction, [](const SimResourceT &R) {
+        return R.ResetAsserted ? SAHPI_RESET_ASSERT : SAHPI_RESET_DEASSERT;
+    });
 }
 
 SaErrorT simResourceResetStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiResetActionT ResetAction,
                                   void *UserDefined) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    switch (simRaw(ResetAction)) {
-    case SAHPI_COLD_RESET:
-    case SAHPI_WARM_RESET:
-        // A resource held in reset has to be let go first.
-        if (resource->ResetAsserted) {
-            return SA_ERR_HPI_INVALID_REQUEST;
-        }
-        resource->ResetCount++;
-        break;
-    case SAHPI_RESET_ASSERT:
-        resource->ResetAsserted = SAHPI_TRUE;
-        break;
-    case SAHPI_RESET_DEASSERT:
-        resource->ResetAsserted = SAHPI_FALSE;
-        break;
-    default:
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    // A reset stops the resource's watchdogs, as on real boards.
-    if (simRaw(ResetAction) != SAHPI_RESET_DEASSERT) {
-        for (SaHpiUint32T i = 0; i < resource->RecordCount; i++) {
-            if (resource->Records[i].Type == SAHPI_WATCHDOG_RDR) {
-                simWatchdogStop(&resource->Records[i]);
+    return simWithResource(UserDefined, [&](SimResourceT &R) {
+        switch (simRaw(ResetAction)) {
+        case SAHPI_COLD_RESET:
+        case SAHPI_WARM_RESET:
+            // A resource held in reset has to be let go first.
+            if (R.ResetAsserted) {
+                return SA_ERR_HPI_INVALID_REQUEST;
             }
+            R.ResetCount++;
+            break;
+        case SAHPI_RESET_ASSERT:
+            R.ResetAsserted = SAHPI_TRUE;
+            break;
+        case SAHPI_RESET_DEASSERT:
+            R.ResetAsserted = SAHPI_FALSE;
+            break;
+        default:
+            return SA_ERR_HPI_INVALID_PARAMS;
         }
-    }
-    simSensorsEvaluate(resource);
-    return SA_OK;
+        // A reset stops the resource's watchdogs, as on real boards.
+        if (simRaw(ResetAction) != SAHPI_RESET_DEASSERT) {
+            stopWatchdogs(R);
+        }
+        simSensorsEvaluate(&R);
+        return SA_OK;
+    });
 }
 
 // ---- Hot swap ----
@@ -152,132 +146,89 @@ SaErrorT simResourceResetStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiResetAc
 
 SaErrorT simHotSwapControlRequest(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    resource->HotSwap.Managed = SAHPI_TRUE;
-    return SA_OK;
+    return simWithResource(UserDefined, [](SimResourceT &R) {
+        R.HotSwap.Managed = SAHPI_TRUE;
+        return SA_OK;
+    });
 }
 
 SaErrorT simResourceActiveSet(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    SimHotSwapT &hs = resource->HotSwap;
-    if (!hs.Managed || (hs.State != SAHPI_HS_STATE_INSERTION_PENDING &&
-                        hs.State != SAHPI_HS_STATE_EXTRACTION_PENDING)) {
-        return SA_ERR_HPI_INVALID_REQUEST;
-    }
-    hs.State = SAHPI_HS_STATE_ACTIVE_HEALTHY;
-    return SA_OK;
+    return completePending(UserDefined, SAHPI_HS_STATE_ACTIVE_HEALTHY);
 }
 
 SaErrorT simResourceInactiveSet(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    SimHotSwapT &hs = resource->HotSwap;
-    if (!hs.Managed || (hs.State != SAHPI_HS_STATE_INSERTION_PENDING &&
-                        hs.State != SAHPI_HS_STATE_EXTRACTION_PENDING)) {
-        return SA_ERR_HPI_INVALID_REQUEST;
-    }
-    hs.State = SAHPI_HS_STATE_INACTIVE;
-    return SA_OK;
+    return completePending(UserDefined, SAHPI_HS_STATE_INACTIVE);
 }
 
 SaErrorT simAutoExtractTimeoutGet(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined,
                                   SaHpiTimeoutT *Timeout) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr || Timeout == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    *Timeout = resource->HotSwap.AutoExtractTimeout;
-    return SA_OK;
+    return simReadResource(UserDefined, Timeout,
+                           [](const SimResourceT &R) { return R.HotSwap.AutoExtractTimeout; });
 }
 
 SaErrorT simAutoExtractTimeoutSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiTimeoutT Timeout,
                                   void *UserDefined) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr || (Timeout < 0 && Timeout != SAHPI_TIMEOUT_BLOCK)) {
+    if (Timeout < 0 && Timeout != SAHPI_TIMEOUT_BLOCK) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    SimLock lock(resource);
-    resource->HotSwap.AutoExtractTimeout = Timeout;
-    return SA_OK;
+    return simWithResource(UserDefined, [&](SimResourceT &R) {
+        R.HotSwap.AutoExtractTimeout = Timeout;
+        return SA_OK;
+    });
 }
 
 SaErrorT simHotSwapStateGet(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined,
                             SaHpiHsStateT *State) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr || State == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    *State = resource->HotSwap.State;
-    return SA_OK;
+    return simReadResource(UserDefined, State,
+                           [](const SimResourceT &R) { return R.HotSwap.State; });
 }
 
 SaErrorT simHotSwapActionRequest(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiHsActionT Action,
                                  void *UserDefined) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    SimHotSwapT &hs = resource->HotSwap;
-    switch (simRaw(Action)) {
-    case SAHPI_HS_ACTION_INSERTION:
-        if (hs.State != SAHPI_HS_STATE_INACTIVE) {
-            return SA_ERR_HPI_INVALID_REQUEST;
+    return simWithResource(UserDefined, [&](SimResourceT &R) {
+        SimHotSwapT &hs = R.HotSwap;
+        switch (simRaw(Action)) {
+        case SAHPI_HS_ACTION_INSERTION:
+            if (hs.State != SAHPI_HS_STATE_INACTIVE) {
+                return SA_ERR_HPI_INVALID_REQUEST;
+            }
+            hs.State =
+                hs.Managed ? SAHPI_HS_STATE_INSERTION_PENDING : SAHPI_HS_STATE_ACTIVE_HEALTHY;
+            return SA_OK;
+        case SAHPI_HS_ACTION_EXTRACTION:
+            if (hs.State != SAHPI_HS_STATE_ACTIVE_HEALTHY &&
+                hs.State != SAHPI_HS_STATE_ACTIVE_UNHEALTHY) {
+                return SA_ERR_HPI_INVALID_REQUEST;
+            }
+            hs.State = hs.Managed ? SAHPI_HS_STATE_EXTRACTION_PENDING : SAHPI_HS_STATE_INACTIVE;
+            return SA_OK;
+        default:
+            return SA_ERR_HPI_INVALID_PARAMS;
         }
-        hs.State = hs.Managed ? SAHPI_HS_STATE_INSERTION_PENDING : SAHPI_HS_STATE_ACTIVE_HEALTHY;
-        return SA_OK;
-    case SAHPI_HS_ACTION_EXTRACTION:
-        if (hs.State != SAHPI_HS_STATE_ACTIVE_HEALTHY &&
-            hs.State != SAHPI_HS_STATE_ACTIVE_UNHEALTHY) {
-            return SA_ERR_HPI_INVALID_REQUEST;
-        }
-        hs.State = hs.Managed ? SAHPI_HS_STATE_EXTRACTION_PENDING : SAHPI_HS_STATE_INACTIVE;
-        return SA_OK;
-    default:
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
+    });
 }
 
 SaErrorT simHotSwapIndicatorStateGet(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined,
                                      SaHpiHsIndicatorStateT *State) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr || State == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(resource);
-    *State = resource->HotSwap.Indicator;
-    return SA_OK;
+    return simReadResource(UserDefined, State,
+                           [](const SimResourceT &R) { return R.HotSwap.Indicator; });
 }
 
 SaErrorT simHotSwapIndicatorStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiHsIndicatorStateT State,
                                      void *UserDefined) noexcept
 {
-    SimResourceT *resource = resourceOf(UserDefined);
-    if (resource == nullptr ||
-        (simRaw(State) != SAHPI_HS_INDICATOR_OFF && simRaw(State) != SAHPI_HS_INDICATOR_ON)) {
+    if (simRaw(State) != SAHPI_HS_INDICATOR_OFF && simRaw(State) != SAHPI_HS_INDICATOR_ON) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    SimLock lock(resource);
-    resource->HotSwap.Indicator = State;
-    return SA_OK;
+    return simWithResource(UserDefined, [&](SimResourceT &R) {
+        R.HotSwap.Indicator = State;
+        return SA_OK;
+    });
 }

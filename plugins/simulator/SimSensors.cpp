@@ -295,12 +295,6 @@ void readingOf(const SimRecordT *Record, SaHpiUint32T Raw, SaHpiSensorReadingT *
     Reading->EventStatus.EventStatus = st.State;
 }
 
-SimRecordT *sensorOf(void *UserData) noexcept
-{
-    auto *record = static_cast<SimRecordT *>(UserData);
-    return record != nullptr && record->Type == SAHPI_SENSOR_RDR ? record : nullptr;
-}
-
 void defaults(SimRecordT *Record) noexcept
 {
     SimSensorStateT &st = Record->Sensor;
@@ -315,6 +309,74 @@ void defaults(SimRecordT *Record) noexcept
     }
     st.Enables.AssertEvents = s->AssertEvents;
     st.Enables.DeassertEvents = s->DeassertEvents;
+}
+
+// The frame of the threshold slots: a sensor without thresholds refuses them.
+template <typename Body> SaErrorT withThresholds(void *UserData, Body body) noexcept
+{
+    return simWithRecord(UserData, SAHPI_SENSOR_RDR, [&](SimRecordT &R) {
+        return R.Sensor.Shape->IsThreshold ? body(R) : SA_ERR_HPI_INVALID_CMD;
+    });
+}
+
+// Takes the thresholds a client gives into Valid and Raw.
+SaErrorT mergeThresholds(const SimSensorShapeT *S, SaHpiSensorThresholdsT *T, SaHpiBoolT *Valid,
+                         SaHpiUint32T *Raw) noexcept
+{
+    for (SaHpiUint32T i = 0; i < 8; i++) {
+        const SaHpiSensorReadingT *field = thresholdField(T, i);
+        if (field->ValuesPresent == 0) {
+            continue; // left as it is
+        }
+        SaHpiUint32T value = 0;
+        SaErrorT rc = rawOf(S, field, i < 6, &value);
+        if (rc != SA_OK) {
+            return rc;
+        }
+        if (!(S->WriteThold & ThresholdMask[i])) {
+            // A client that writes back what it read may repeat a fixed value.
+            if (Valid[i] && Raw[i] == value) {
+                continue;
+            }
+            return SA_ERR_HPI_INVALID_CMD;
+        }
+        Valid[i] = SAHPI_TRUE;
+        Raw[i] = value;
+    }
+    return SA_OK;
+}
+
+// Limits must stay ordered: LowCritical <= LowMajor <= LowMinor <= UpMinor <=
+// UpMajor <= UpCritical, counting only those the sensor has.
+bool ordered(const SaHpiBoolT *Valid, const SaHpiUint32T *Raw) noexcept
+{
+    const SaHpiUint32T order[6] = {0, 1, 2, 5, 4, 3};
+    SaHpiInt64T last = -1;
+    for (SaHpiUint32T i : order) {
+        if (!Valid[i]) {
+            continue;
+        }
+        if (static_cast<SaHpiInt64T>(Raw[i]) < last) {
+            return false;
+        }
+        last = Raw[i];
+    }
+    return true;
+}
+
+// The most severe of the alarm states stands for the sensor.
+SaHpiEventStateT worstOf(const SimSensorShapeT *S, SaHpiEventStateT Alarms) noexcept
+{
+    SaHpiEventStateT worst = 0;
+    SaHpiSeverityT severity = SAHPI_OK;
+    for (SaHpiEventStateT bit = 1; bit != 0 && bit <= 0x4000;
+         bit = static_cast<SaHpiEventStateT>(bit << 1)) {
+        if ((Alarms & bit) && (worst == 0 || severityOf(S, bit) < severity)) {
+            worst = bit;
+            severity = severityOf(S, bit);
+        }
+    }
+    return worst;
 }
 
 } // namespace
@@ -367,7 +429,6 @@ void simSensorInitialize(SimRecordT *Record) noexcept
 {
     defaults(Record);
     Record->Sensor.State = 0;
-    Record->Sensor.HasSaved = SAHPI_FALSE;
 }
 
 void simSensorsEvaluate(SimResourceT *Resource) noexcept
@@ -380,30 +441,10 @@ void simSensorsEvaluate(SimResourceT *Resource) noexcept
     }
 }
 
-SaErrorT simSensorParm(SimRecordT *Record, SimParmT Action) noexcept
+void simSensorDefaults(SimRecordT *Record) noexcept
 {
-    SimSensorStateT &st = Record->Sensor;
-    switch (Action) {
-    case SIM_PARM_DEFAULT:
-        defaults(Record);
-        break;
-    case SIM_PARM_SAVE:
-        memcpy(st.SavedValid, st.Valid, sizeof(st.Valid));
-        memcpy(st.SavedRaw, st.Raw, sizeof(st.Raw));
-        st.SavedEnables = st.Enables;
-        st.HasSaved = SAHPI_TRUE;
-        return SA_OK;
-    case SIM_PARM_RESTORE:
-        if (!st.HasSaved) {
-            return SA_ERR_HPI_INVALID_REQUEST;
-        }
-        memcpy(st.Valid, st.SavedValid, sizeof(st.Valid));
-        memcpy(st.Raw, st.SavedRaw, sizeof(st.Raw));
-        st.Enables = st.SavedEnables;
-        break;
-    }
+    defaults(Record);
     evaluate(Record);
-    return SA_OK;
 }
 
 // ---- Slots ----
@@ -411,24 +452,20 @@ SaErrorT simSensorParm(SimRecordT *Record, SimParmT Action) noexcept
 SaErrorT simSensorReadingGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT, SaHpiEventCategoryT,
                              SaHpiRdrT *, void *UserData, SaHpiSensorReadingT *Reading) noexcept
 {
-    SimRecordT *record = sensorOf(UserData);
-    if (record == nullptr || Reading == nullptr) {
+    if (Reading == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    SimLock lock(record->Resource);
-    if (record->Removed) {
-        return SA_ERR_HPI_NOT_PRESENT;
-    }
-    SaHpiUint32T raw = evaluate(record);
-    readingOf(record, raw, Reading);
-    return SA_OK;
+    return simWithRecord(UserData, SAHPI_SENSOR_RDR, [&](SimRecordT &R) {
+        readingOf(&R, evaluate(&R), Reading);
+        return SA_OK;
+    });
 }
 
 SaErrorT simSensorReadingConvert(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT, SaHpiRdrT *,
                                  SaHpiSensorReadingT *ReadingInput, void *UserData,
                                  SaHpiSensorReadingT *ConvertedReading) noexcept
 {
-    SimRecordT *record = sensorOf(UserData);
+    SimRecordT *record = simRecordOf(UserData, SAHPI_SENSOR_RDR);
     if (record == nullptr || ReadingInput == nullptr || ConvertedReading == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
@@ -461,165 +498,107 @@ SaErrorT simSensorReadingConvert(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNu
 SaErrorT simSensorThresholdsGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT, SaHpiRdrT *,
                                 void *UserData, SaHpiSensorThresholdsT *SensorThresholds) noexcept
 {
-    SimRecordT *record = sensorOf(UserData);
-    if (record == nullptr || SensorThresholds == nullptr) {
+    if (SensorThresholds == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    SimLock lock(record->Resource);
-    if (record->Removed) {
-        return SA_ERR_HPI_NOT_PRESENT;
-    }
-    const SimSensorStateT &st = record->Sensor;
-    if (!st.Shape->IsThreshold) {
-        return SA_ERR_HPI_INVALID_CMD;
-    }
-    memset(SensorThresholds, 0, sizeof(*SensorThresholds));
-    for (SaHpiUint32T i = 0; i < 8; i++) {
-        if (st.Valid[i] && (st.Shape->ReadThold & ThresholdMask[i])) {
-            numericReading(st.Shape, st.Raw[i], i < 6, thresholdField(SensorThresholds, i));
+    return withThresholds(UserData, [&](SimRecordT &R) {
+        const SimSensorStateT &st = R.Sensor;
+        memset(SensorThresholds, 0, sizeof(*SensorThresholds));
+        for (SaHpiUint32T i = 0; i < 8; i++) {
+            if (st.Valid[i] && (st.Shape->ReadThold & ThresholdMask[i])) {
+                numericReading(st.Shape, st.Raw[i], i < 6, thresholdField(SensorThresholds, i));
+            }
         }
-    }
-    return SA_OK;
+        return SA_OK;
+    });
 }
 
 SaErrorT simSensorThresholdsSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT, SaHpiRdrT *,
                                 SaHpiSensorThresholdsT *SensorThresholds, void *UserData) noexcept
 {
-    SimRecordT *record = sensorOf(UserData);
-    if (record == nullptr || SensorThresholds == nullptr) {
+    if (SensorThresholds == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    SimLock lock(record->Resource);
-    if (record->Removed) {
-        return SA_ERR_HPI_NOT_PRESENT;
-    }
-    SimSensorStateT &st = record->Sensor;
-    const SimSensorShapeT *s = st.Shape;
-    if (!s->IsThreshold) {
-        return SA_ERR_HPI_INVALID_CMD;
-    }
-    SaHpiBoolT valid[8];
-    SaHpiUint32T raw[8];
-    memcpy(valid, st.Valid, sizeof(valid));
-    memcpy(raw, st.Raw, sizeof(raw));
-    for (SaHpiUint32T i = 0; i < 8; i++) {
-        const SaHpiSensorReadingT *field = thresholdField(SensorThresholds, i);
-        if (field->ValuesPresent == 0) {
-            continue; // left as it is
-        }
-        SaHpiUint32T value = 0;
-        SaErrorT rc = rawOf(s, field, i < 6, &value);
+    return withThresholds(UserData, [&](SimRecordT &R) {
+        SimSensorStateT &st = R.Sensor;
+        SaHpiBoolT valid[8];
+        SaHpiUint32T raw[8];
+        memcpy(valid, st.Valid, sizeof(valid));
+        memcpy(raw, st.Raw, sizeof(raw));
+        SaErrorT rc = mergeThresholds(st.Shape, SensorThresholds, valid, raw);
         if (rc != SA_OK) {
             return rc;
         }
-        if (!(s->WriteThold & ThresholdMask[i])) {
-            // A client that writes back what it read may repeat a fixed value.
-            if (valid[i] && raw[i] == value) {
-                continue;
-            }
-            return SA_ERR_HPI_INVALID_CMD;
-        }
-        valid[i] = SAHPI_TRUE;
-        raw[i] = value;
-    }
-    // Limits must stay ordered: LowCritical <= LowMajor <= LowMinor <=
-    // UpMinor <= UpMajor <= UpCritical, counting only those the sensor has.
-    const SaHpiUint32T order[6] = {0, 1, 2, 5, 4, 3};
-    SaHpiInt64T last = -1;
-    for (SaHpiUint32T i : order) {
-        if (!valid[i]) {
-            continue;
-        }
-        if (static_cast<SaHpiInt64T>(raw[i]) < last) {
+        if (!ordered(valid, raw)) {
             return SA_ERR_HPI_INVALID_DATA;
         }
-        last = raw[i];
-    }
-    memcpy(st.Valid, valid, sizeof(valid));
-    memcpy(st.Raw, raw, sizeof(raw));
-    evaluate(record);
-    return SA_OK;
+        memcpy(st.Valid, valid, sizeof(valid));
+        memcpy(st.Raw, raw, sizeof(raw));
+        evaluate(&R);
+        return SA_OK;
+    });
 }
 
 SaErrorT simSensorEventEnablesGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT, void *UserData,
                                   SaHpiCapabilitiesT, SaHpiEventCategoryT,
                                   SaHpiSensorEvtEnablesT *Enables) noexcept
 {
-    SimRecordT *record = sensorOf(UserData);
-    if (record == nullptr || Enables == nullptr) {
+    if (Enables == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    SimLock lock(record->Resource);
-    if (record->Removed) {
-        return SA_ERR_HPI_NOT_PRESENT;
-    }
-    *Enables = record->Sensor.Enables;
-    return SA_OK;
+    return simWithRecord(UserData, SAHPI_SENSOR_RDR, [&](SimRecordT &R) {
+        *Enables = R.Sensor.Enables;
+        return SA_OK;
+    });
 }
 
 SaErrorT simSensorEventEnablesSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT,
                                   SaHpiSensorEvtEnablesT *Enables, SaHpiRdrT *, SaHpiCapabilitiesT,
                                   void *UserData) noexcept
 {
-    SimRecordT *record = sensorOf(UserData);
-    if (record == nullptr || Enables == nullptr) {
+    if (Enables == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    SimLock lock(record->Resource);
-    if (record->Removed) {
-        return SA_ERR_HPI_NOT_PRESENT;
-    }
-    SimSensorStateT &st = record->Sensor;
-    const SimSensorShapeT *s = st.Shape;
-    if (s->EventCtrl == SAHPI_SEC_NO_EVENTS) {
-        return SA_ERR_HPI_INVALID_CMD;
-    }
-    constexpr SaHpiSensorStatusT writable =
-        SAHPI_SENSTAT_EVENTS_ENABLED | SAHPI_SENSTAT_SCAN_ENABLED;
-    if (Enables->SensorStatus & ~(writable | SAHPI_SENSTAT_BUSY)) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    if ((Enables->AssertEvents | Enables->DeassertEvents) & ~s->Events) {
-        return SA_ERR_HPI_INVALID_DATA; // states the sensor never reports
-    }
-    st.Enables.SensorStatus = static_cast<SaHpiSensorStatusT>(Enables->SensorStatus & writable);
-    // Only a sensor controlled event by event takes the masks; the others
-    // switch their events as a whole through the status.
-    if (s->EventCtrl == SAHPI_SEC_PER_EVENT) {
-        st.Enables.AssertEvents = Enables->AssertEvents;
-        st.Enables.DeassertEvents = Enables->DeassertEvents;
-    }
-    return SA_OK;
+    return simWithRecord(UserData, SAHPI_SENSOR_RDR, [&](SimRecordT &R) {
+        SimSensorStateT &st = R.Sensor;
+        const SimSensorShapeT *s = st.Shape;
+        if (s->EventCtrl == SAHPI_SEC_NO_EVENTS) {
+            return SA_ERR_HPI_INVALID_CMD;
+        }
+        constexpr SaHpiSensorStatusT writable =
+            SAHPI_SENSTAT_EVENTS_ENABLED | SAHPI_SENSTAT_SCAN_ENABLED;
+        if (Enables->SensorStatus & ~(writable | SAHPI_SENSTAT_BUSY)) {
+            return SA_ERR_HPI_INVALID_PARAMS;
+        }
+        if ((Enables->AssertEvents | Enables->DeassertEvents) & ~s->Events) {
+            return SA_ERR_HPI_INVALID_DATA; // states the sensor never reports
+        }
+        st.Enables.SensorStatus = static_cast<SaHpiSensorStatusT>(Enables->SensorStatus & writable);
+        // Only a sensor controlled event by event takes the masks; the others
+        // switch their events as a whole through the status.
+        if (s->EventCtrl == SAHPI_SEC_PER_EVENT) {
+            st.Enables.AssertEvents = Enables->AssertEvents;
+            st.Enables.DeassertEvents = Enables->DeassertEvents;
+        }
+        return SA_OK;
+    });
 }
 
 SaErrorT simActiveAlarmTranslate(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNumT, void *UserData,
                                  SaHpiRdrT *, SaHpiRptEntryT *, SaHpiEventT *Event) noexcept
 {
-    SimRecordT *record = sensorOf(UserData);
-    if (record == nullptr || Event == nullptr) {
+    if (Event == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    SimLock lock(record->Resource);
-    if (record->Removed) {
-        return SA_ERR_HPI_NOT_PRESENT;
-    }
-    SaHpiUint32T raw = evaluate(record);
-    SaHpiEventStateT alarms = alarmsOf(record->Sensor.Shape, record->Sensor.State);
-    if (alarms == 0) {
-        return SA_ERR_HPI_NOT_PRESENT; // not in alarm: no event
-    }
-    // The most severe state stands for the sensor.
-    SaHpiEventStateT worst = 0;
-    SaHpiSeverityT severity = SAHPI_OK;
-    for (SaHpiEventStateT bit = 1; bit != 0 && bit <= 0x4000;
-         bit = static_cast<SaHpiEventStateT>(bit << 1)) {
-        if ((alarms & bit) && (worst == 0 || severityOf(record->Sensor.Shape, bit) < severity)) {
-            worst = bit;
-            severity = severityOf(record->Sensor.Shape, bit);
+    return simWithRecord(UserData, SAHPI_SENSOR_RDR, [&](SimRecordT &R) {
+        SaHpiUint32T raw = evaluate(&R);
+        SaHpiEventStateT alarms = alarmsOf(R.Sensor.Shape, R.Sensor.State);
+        if (alarms == 0) {
+            return SA_ERR_HPI_NOT_PRESENT; // not in alarm: no event
         }
-    }
-    sensorEvent(record, raw, worst, SAHPI_TRUE, 0, Event);
-    Event->EventDataUnion.SensorEvent.OptionalDataPresent &=
-        static_cast<SaHpiSensorOptionalDataT>(~SAHPI_SOD_PREVIOUS_STATE);
-    return SA_OK;
+        sensorEvent(&R, raw, worstOf(R.Sensor.Shape, alarms), SAHPI_TRUE, 0, Event);
+        Event->EventDataUnion.SensorEvent.OptionalDataPresent &=
+            static_cast<SaHpiSensorOptionalDataT>(~SAHPI_SOD_PREVIOUS_STATE);
+        return SA_OK;
+    });
 }

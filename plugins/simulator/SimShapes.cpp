@@ -18,29 +18,110 @@ constexpr SaHpiSensorThdMaskT UP_ALL = SAHPI_STM_UP_MINOR | SAHPI_STM_UP_MAJOR |
 constexpr SaHpiSensorThdMaskT LOW_WRITABLE = SAHPI_STM_LOW_MINOR | SAHPI_STM_LOW_MAJOR;
 constexpr SaHpiSensorThdMaskT UP_WRITABLE = SAHPI_STM_UP_MINOR | SAHPI_STM_UP_MAJOR;
 
+// A threshold sensor is evented state by state on the sides it watches
+// (Events: the lower states, the upper ones or both): it reads all limits of
+// those sides and both hysteresis values, and lets the operator move the
+// minor and major limits and the hysteresis; the critical ones are fixed.
+constexpr SimSensorShapeT thresholdSensor(SimSensorShapeT S)
+{
+    const bool low = (S.Events & LOWER_ALL) != 0;
+    const bool up = (S.Events & UPPER_ALL) != 0;
+    S.Category = SAHPI_EC_THRESHOLD;
+    S.EventCtrl = SAHPI_SEC_PER_EVENT;
+    S.IsThreshold = SAHPI_TRUE;
+    S.ReadThold = (low ? LOW_ALL : 0) | (up ? UP_ALL : 0) | HYSTERESIS;
+    S.WriteThold = (low ? LOW_WRITABLE : 0) | (up ? UP_WRITABLE : 0) | HYSTERESIS;
+    S.AssertEvents = S.Events;
+    S.DeassertEvents = S.Events;
+    return S;
+}
+
 // Thresholds are raw: LowCritical, LowMajor, LowMinor, UpCritical, UpMajor,
 // UpMinor, positive and negative hysteresis. Unreadable ones are 0.
 // Conversion: value = (M * raw + B * 10^ExpB) * 10^ExpR.
 
 // degrees C = raw
-const SimSensorShapeT InletTemperature = {
+constexpr SimSensorShapeT InletTemperature = thresholdSensor({
     .IdString = "Inlet temperature",
     .Type = SAHPI_TEMPERATURE,
-    .Category = SAHPI_EC_THRESHOLD,
-    .EventCtrl = SAHPI_SEC_PER_EVENT,
     .Events = LOWER_ALL | UPPER_ALL,
-    .IsThreshold = SAHPI_TRUE,
     .Units = SAHPI_SU_DEGREES_C,
     .M = 1,
     .Source = SIM_SRC_FIXED,
     .NominalRaw = 25,
     .OffRaw = 25,
     .Thresholds = {5, 8, 10, 45, 40, 35, 2, 2},
-    .ReadThold = LOW_ALL | UP_ALL | HYSTERESIS,
-    .WriteThold = LOW_WRITABLE | UP_WRITABLE | HYSTERESIS,
-    .AssertEvents = LOWER_ALL | UPPER_ALL,
-    .DeassertEvents = LOWER_ALL | UPPER_ALL,
-};
+});
+
+constexpr SimSensorShapeT CpuTemperature = thresholdSensor({
+    .IdString = "CPU temperature",
+    .Type = SAHPI_TEMPERATURE,
+    .Events = UPPER_ALL,
+    .Units = SAHPI_SU_DEGREES_C,
+    .M = 1,
+    .Source = SIM_SRC_POWERED,
+    .NominalRaw = 45,
+    .OffRaw = 25,
+    .Thresholds = {0, 0, 0, 90, 80, 70, 2, 2},
+});
+
+// volts = raw * 0.02
+constexpr SimSensorShapeT Board3V3 = thresholdSensor({
+    .IdString = "Board 3.3V",
+    .Type = SAHPI_VOLTAGE,
+    .Events = LOWER_ALL | UPPER_ALL,
+    .Units = SAHPI_SU_VOLTS,
+    .M = 2,
+    .ExpR = -2,
+    .Source = SIM_SRC_POWERED,
+    .NominalRaw = 165,
+    .Thresholds = {149, 155, 157, 181, 175, 172, 1, 1},
+});
+
+// volts = raw * 0.06; the supply's output is the same 12 V rail.
+constexpr SimSensorShapeT Board12V = thresholdSensor({
+    .IdString = "Board 12V",
+    .Type = SAHPI_VOLTAGE,
+    .Events = LOWER_ALL | UPPER_ALL,
+    .Units = SAHPI_SU_VOLTS,
+    .M = 6,
+    .ExpR = -2,
+    .Source = SIM_SRC_POWERED,
+    .NominalRaw = 200,
+    .Thresholds = {180, 190, 193, 220, 210, 207, 1, 1},
+});
+
+constexpr SimSensorShapeT named(SimSensorShapeT S, const char *IdString)
+{
+    S.IdString = IdString;
+    return S;
+}
+
+constexpr SimSensorShapeT SupplyOutput = named(Board12V, "Output 12V");
+
+// RPM = raw * 50; the fan-speed control sets raw = percent * 8 / 5.
+constexpr SimSensorShapeT FanSpeed = thresholdSensor({
+    .IdString = "Fan %u speed",
+    .Type = SAHPI_FAN,
+    .Events = LOWER_ALL,
+    .Units = SAHPI_SU_RPM,
+    .M = 50,
+    .Source = SIM_SRC_FAN,
+    .NominalRaw = 96,
+    .Thresholds = {20, 30, 40, 0, 0, 0, 2, 2},
+});
+
+constexpr SimSensorShapeT SupplyTemperature = thresholdSensor({
+    .IdString = "Supply temperature",
+    .Type = SAHPI_TEMPERATURE,
+    .Events = UPPER_ALL,
+    .Units = SAHPI_SU_DEGREES_C,
+    .M = 1,
+    .Source = SIM_SRC_POWERED,
+    .NominalRaw = 40,
+    .OffRaw = 25,
+    .Thresholds = {0, 0, 0, 80, 70, 60, 2, 2},
+});
 
 const SimSensorShapeT ChassisIntrusion = {
     .IdString = "Chassis intrusion",
@@ -52,122 +133,6 @@ const SimSensorShapeT ChassisIntrusion = {
     .Source = SIM_SRC_INTRUSION,
     .AssertEvents = SAHPI_ES_STATE_ASSERTED,
     .DeassertEvents = SAHPI_ES_STATE_ASSERTED,
-};
-
-const SimSensorShapeT CpuTemperature = {
-    .IdString = "CPU temperature",
-    .Type = SAHPI_TEMPERATURE,
-    .Category = SAHPI_EC_THRESHOLD,
-    .EventCtrl = SAHPI_SEC_PER_EVENT,
-    .Events = UPPER_ALL,
-    .IsThreshold = SAHPI_TRUE,
-    .Units = SAHPI_SU_DEGREES_C,
-    .M = 1,
-    .Source = SIM_SRC_POWERED,
-    .NominalRaw = 45,
-    .OffRaw = 25,
-    .Thresholds = {0, 0, 0, 90, 80, 70, 2, 2},
-    .ReadThold = UP_ALL | HYSTERESIS,
-    .WriteThold = UP_WRITABLE | HYSTERESIS,
-    .AssertEvents = UPPER_ALL,
-    .DeassertEvents = UPPER_ALL,
-};
-
-// volts = raw * 0.02
-const SimSensorShapeT Board3V3 = {
-    .IdString = "Board 3.3V",
-    .Type = SAHPI_VOLTAGE,
-    .Category = SAHPI_EC_THRESHOLD,
-    .EventCtrl = SAHPI_SEC_PER_EVENT,
-    .Events = LOWER_ALL | UPPER_ALL,
-    .IsThreshold = SAHPI_TRUE,
-    .Units = SAHPI_SU_VOLTS,
-    .M = 2,
-    .ExpR = -2,
-    .Source = SIM_SRC_POWERED,
-    .NominalRaw = 165,
-    .Thresholds = {149, 155, 157, 181, 175, 172, 1, 1},
-    .ReadThold = LOW_ALL | UP_ALL | HYSTERESIS,
-    .WriteThold = LOW_WRITABLE | UP_WRITABLE | HYSTERESIS,
-    .AssertEvents = LOWER_ALL | UPPER_ALL,
-    .DeassertEvents = LOWER_ALL | UPPER_ALL,
-};
-
-// volts = raw * 0.06
-const SimSensorShapeT Board12V = {
-    .IdString = "Board 12V",
-    .Type = SAHPI_VOLTAGE,
-    .Category = SAHPI_EC_THRESHOLD,
-    .EventCtrl = SAHPI_SEC_PER_EVENT,
-    .Events = LOWER_ALL | UPPER_ALL,
-    .IsThreshold = SAHPI_TRUE,
-    .Units = SAHPI_SU_VOLTS,
-    .M = 6,
-    .ExpR = -2,
-    .Source = SIM_SRC_POWERED,
-    .NominalRaw = 200,
-    .Thresholds = {180, 190, 193, 220, 210, 207, 1, 1},
-    .ReadThold = LOW_ALL | UP_ALL | HYSTERESIS,
-    .WriteThold = LOW_WRITABLE | UP_WRITABLE | HYSTERESIS,
-    .AssertEvents = LOWER_ALL | UPPER_ALL,
-    .DeassertEvents = LOWER_ALL | UPPER_ALL,
-};
-
-// RPM = raw * 50; the fan-speed control sets raw = percent * 8 / 5.
-const SimSensorShapeT FanSpeed = {
-    .IdString = "Fan %u speed",
-    .Type = SAHPI_FAN,
-    .Category = SAHPI_EC_THRESHOLD,
-    .EventCtrl = SAHPI_SEC_PER_EVENT,
-    .Events = LOWER_ALL,
-    .IsThreshold = SAHPI_TRUE,
-    .Units = SAHPI_SU_RPM,
-    .M = 50,
-    .Source = SIM_SRC_FAN,
-    .NominalRaw = 96,
-    .Thresholds = {20, 30, 40, 0, 0, 0, 2, 2},
-    .ReadThold = LOW_ALL | HYSTERESIS,
-    .WriteThold = LOW_WRITABLE | HYSTERESIS,
-    .AssertEvents = LOWER_ALL,
-    .DeassertEvents = LOWER_ALL,
-};
-
-const SimSensorShapeT SupplyOutput = {
-    .IdString = "Output 12V",
-    .Type = SAHPI_VOLTAGE,
-    .Category = SAHPI_EC_THRESHOLD,
-    .EventCtrl = SAHPI_SEC_PER_EVENT,
-    .Events = LOWER_ALL | UPPER_ALL,
-    .IsThreshold = SAHPI_TRUE,
-    .Units = SAHPI_SU_VOLTS,
-    .M = 6,
-    .ExpR = -2,
-    .Source = SIM_SRC_POWERED,
-    .NominalRaw = 200,
-    .Thresholds = {180, 190, 193, 220, 210, 207, 1, 1},
-    .ReadThold = LOW_ALL | UP_ALL | HYSTERESIS,
-    .WriteThold = LOW_WRITABLE | UP_WRITABLE | HYSTERESIS,
-    .AssertEvents = LOWER_ALL | UPPER_ALL,
-    .DeassertEvents = LOWER_ALL | UPPER_ALL,
-};
-
-const SimSensorShapeT SupplyTemperature = {
-    .IdString = "Supply temperature",
-    .Type = SAHPI_TEMPERATURE,
-    .Category = SAHPI_EC_THRESHOLD,
-    .EventCtrl = SAHPI_SEC_PER_EVENT,
-    .Events = UPPER_ALL,
-    .IsThreshold = SAHPI_TRUE,
-    .Units = SAHPI_SU_DEGREES_C,
-    .M = 1,
-    .Source = SIM_SRC_POWERED,
-    .NominalRaw = 40,
-    .OffRaw = 25,
-    .Thresholds = {0, 0, 0, 80, 70, 60, 2, 2},
-    .ReadThold = UP_ALL | HYSTERESIS,
-    .WriteThold = UP_WRITABLE | HYSTERESIS,
-    .AssertEvents = UPPER_ALL,
-    .DeassertEvents = UPPER_ALL,
 };
 
 const SimSensorShapeT SupplyStatus = {

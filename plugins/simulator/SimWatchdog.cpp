@@ -11,12 +11,6 @@ namespace
 
 constexpr SaHpiUint32T INITIAL_COUNT_MS = 10000;
 
-SimRecordT *watchdogOf(void *UserData) noexcept
-{
-    auto *record = static_cast<SimRecordT *>(UserData);
-    return record != nullptr && record->Type == SAHPI_WATCHDOG_RDR ? record : nullptr;
-}
-
 SaHpiUint32T remaining(const SimWatchdogStateT &W, SaHpiInt64T NowMs) noexcept
 {
     if (!W.Running) {
@@ -198,73 +192,59 @@ SaErrorT simWatchdogParm(SimRecordT *Record, SimParmT Action) noexcept
 SaErrorT simWatchdogTimerGet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiWatchdogNumT, void *UserData,
                              SaHpiWatchdogT *Watchdog) noexcept
 {
-    SimRecordT *record = watchdogOf(UserData);
-    if (record == nullptr || Watchdog == nullptr) {
+    if (Watchdog == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    SimLock lock(record->Resource);
-    if (record->Removed) {
-        return SA_ERR_HPI_NOT_PRESENT;
-    }
-    const SimWatchdogStateT &w = record->Watchdog;
-    *Watchdog = w.Config;
-    Watchdog->Running = w.Running;
-    Watchdog->PresentCount = remaining(w, simMonotonicMs());
-    return SA_OK;
+    return simWithRecord(UserData, SAHPI_WATCHDOG_RDR, [&](SimRecordT &R) {
+        const SimWatchdogStateT &w = R.Watchdog;
+        *Watchdog = w.Config;
+        Watchdog->Running = w.Running;
+        Watchdog->PresentCount = remaining(w, simMonotonicMs());
+        return SA_OK;
+    });
 }
 
 SaErrorT simWatchdogTimerSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiWatchdogNumT,
                              SaHpiWatchdogT *Watchdog, void *UserData) noexcept
 {
-    SimRecordT *record = watchdogOf(UserData);
-    if (record == nullptr || Watchdog == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    if (!validConfig(*Watchdog)) {
+    if (simRecordOf(UserData, SAHPI_WATCHDOG_RDR) == nullptr || Watchdog == nullptr ||
+        !validConfig(*Watchdog)) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
     if (Watchdog->PreTimeoutInterval > Watchdog->InitialCount) {
         return SA_ERR_HPI_INVALID_DATA;
     }
-    SimLock lock(record->Resource);
-    if (record->Removed) {
-        return SA_ERR_HPI_NOT_PRESENT;
-    }
-    SimWatchdogStateT &w = record->Watchdog;
-    SaHpiWatchdogExpFlagsT flags = w.Config.TimerUseExpFlags;
-    w.Config = *Watchdog;
-    // Expiration flags written as 1 are cleared; the others stay.
-    w.Config.TimerUseExpFlags =
-        static_cast<SaHpiWatchdogExpFlagsT>(flags & ~Watchdog->TimerUseExpFlags);
-    w.Config.Running = SAHPI_FALSE;
-    w.Config.PresentCount = 0;
-    // A running timer told to keep running restarts with the new count; a
-    // stopped one stays stopped until a reset starts it.
-    if (Watchdog->Running && w.Running) {
-        start(w);
-    } else {
-        w.Running = SAHPI_FALSE;
-        w.StoppedCount = w.Config.InitialCount;
-    }
-    return SA_OK;
+    return simWithRecord(UserData, SAHPI_WATCHDOG_RDR, [&](SimRecordT &R) {
+        SimWatchdogStateT &w = R.Watchdog;
+        SaHpiWatchdogExpFlagsT flags = w.Config.TimerUseExpFlags;
+        w.Config = *Watchdog;
+        // Expiration flags written as 1 are cleared; the others stay.
+        w.Config.TimerUseExpFlags =
+            static_cast<SaHpiWatchdogExpFlagsT>(flags & ~Watchdog->TimerUseExpFlags);
+        w.Config.Running = SAHPI_FALSE;
+        w.Config.PresentCount = 0;
+        // A running timer told to keep running restarts with the new count; a
+        // stopped one stays stopped until a reset starts it.
+        if (Watchdog->Running && w.Running) {
+            start(w);
+        } else {
+            w.Running = SAHPI_FALSE;
+            w.StoppedCount = w.Config.InitialCount;
+        }
+        return SA_OK;
+    });
 }
 
 SaErrorT simWatchdogTimerReset(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiWatchdogNumT,
                                void *UserData) noexcept
 {
-    SimRecordT *record = watchdogOf(UserData);
-    if (record == nullptr) {
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    SimLock lock(record->Resource);
-    if (record->Removed) {
-        return SA_ERR_HPI_NOT_PRESENT;
-    }
-    SimWatchdogStateT &w = record->Watchdog;
-    // Once the pre-timeout has fired, only the expiration ends the countdown.
-    if (w.Running && w.PreTimeoutFired) {
-        return SA_ERR_HPI_INVALID_REQUEST;
-    }
-    start(w);
-    return SA_OK;
+    return simWithRecord(UserData, SAHPI_WATCHDOG_RDR, [](SimRecordT &R) {
+        SimWatchdogStateT &w = R.Watchdog;
+        // Once the pre-timeout has fired, only the expiration ends the countdown.
+        if (w.Running && w.PreTimeoutFired) {
+            return SA_ERR_HPI_INVALID_REQUEST;
+        }
+        start(w);
+        return SA_OK;
+    });
 }
