@@ -10,8 +10,10 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <limits>
 #include <sys/select.h>
 #include <sys/time.h>
+#include <type_traits>
 
 #include "core/utils/KviTrace.h"
 #include "kvi/KviTime.h"
@@ -183,6 +185,25 @@ SaErrorT startWatcher(KviCsCfgContainer *container, const char *mallocMessage)
 }
 
 } // namespace
+
+// Resolves a container argument (null: the default container) into `var`,
+// refusing one that was never initialized: its semaphores are not there.
+#define KVI_CFG_LIVE_CONTAINER(var, arg)                                                           \
+    KviCsCfgContainer *var = resolve(arg);                                                         \
+    if (loadList(var) == nullptr) {                                                                \
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "cfgContainer->KeyValueList pointer is NULL.");             \
+        return SA_ERR_HPI_INVALID_PARAMS;                                                          \
+    }
+
+// Takes one of a container's semaphores into `guard` for the rest of the
+// scope; a wait that fails is logged and the call ends with SA_ERR_HPI_ERROR.
+#define KVI_CFG_SEM_LOCK(guard, sem)                                                               \
+    KVI_SEM_GUARD(guard, sem, KVI_CS_CFG_SEM_TIMEOUT);                                             \
+    if (!guard.held()) {                                                                           \
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Couldn't acquire semaphore");                              \
+        trace.exitMessage("Error");                                                                \
+        return SA_ERR_HPI_ERROR;                                                                   \
+    }
 
 void kviCsConfigSetReadHook(KviCsCfgReadHookT Hook) noexcept
 {
@@ -542,20 +563,11 @@ SaErrorT kviCsCfgDataGet(const char *Key, SaHpiUint32T Size, char *Value,
     KVI_TRACE("Key %s", Key != nullptr ? Key : "(null)");
     KVI_NULL_CHECK(Key);
     KVI_NULL_CHECK(Value);
-    KviCsCfgContainer *cfgContainer = resolve(CfgContainer);
-    if (loadList(cfgContainer) == nullptr) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "cfgContainer->KeyValueList pointer is NULL.");
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
+    KVI_CFG_LIVE_CONTAINER(cfgContainer, CfgContainer);
 
     // Held while the list is walked and the value copied, so a reload can
     // neither swap nor free the list under the reader.
-    KVI_SEM_GUARD(general, &(cfgContainer->GeneralSem), KVI_CS_CFG_SEM_TIMEOUT);
-    if (!general.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Couldn't acquire semaphore");
-        trace.exitMessage("Error");
-        return SA_ERR_HPI_ERROR;
-    }
+    KVI_CFG_SEM_LOCK(general, &(cfgContainer->GeneralSem));
     for (KviCsLinkedListNodeT *node = cfgContainer->KeyValueList->HeadPointer; node != nullptr;
          node = node->Next) {
         auto *pair = static_cast<const KviKeyValuePairT *>(node->Data);
@@ -584,13 +596,27 @@ namespace
 // not a 32-bit number and comes back as truncated.
 constexpr SaHpiUint32T NUMBER_TEXT_SIZE = 12;
 
-SaErrorT fetchNumberText(const char *Key, char (&text)[NUMBER_TEXT_SIZE],
-                         KviCsCfgContainer *CfgContainer)
+// The shape both numeric queries share: fetch the text, convert it, and refuse
+// a saturated value or trailing garbage. The warning carries the name of the
+// query that was called.
+template <typename T>
+SaErrorT readNumber(const char *Key, T *Value, KviCsCfgContainer *CfgContainer,
+                    T (*convert)(const char *, char **), const char *query)
 {
+    char text[NUMBER_TEXT_SIZE];
     SaErrorT rc = kviCsCfgDataGet(Key, NUMBER_TEXT_SIZE, text, CfgContainer);
-    if (rc == SA_OK)
-        rmTrailingWhitespace(text);
-    return rc;
+    if (rc != SA_OK)
+        return rc;
+    rmTrailingWhitespace(text);
+    char *end = nullptr;
+    *Value = convert(text, &end);
+    const bool saturated = *Value == std::numeric_limits<T>::max() ||
+                           (std::is_signed_v<T> && *Value == std::numeric_limits<T>::min());
+    if (!saturated && *end == '\0')
+        return SA_OK;
+    kviCsLogger(__FILE__, __LINE__, query, KVI_LOG_WARN_NUM, "Value %s: %s",
+                saturated ? "out of range" : "has invalid data", text);
+    return SA_ERR_HPI_INVALID_DATA;
 }
 
 } // namespace
@@ -601,25 +627,10 @@ SaErrorT kviCsCfgDataUint32Get(const char *Key, SaHpiUint32T *Value,
     KVI_TRACE("Key %s", Key != nullptr ? Key : "(null)");
     KVI_NULL_CHECK(Key);
     KVI_NULL_CHECK(Value);
-    char text[NUMBER_TEXT_SIZE];
-    SaErrorT rc = fetchNumberText(Key, text, CfgContainer);
-    if (rc != SA_OK) {
+    SaErrorT rc = readNumber(Key, Value, CfgContainer, toUint32, __func__);
+    if (rc != SA_OK)
         trace.exitMessage("Error");
-        return rc;
-    }
-    char *end = nullptr;
-    *Value = toUint32(text, &end);
-    if (*Value == KVI_MAX_UINT32) {
-        KVI_WLOG(KVI_LOG_WARN, "Value out of range: %s", text);
-        trace.exitMessage("Error");
-        return SA_ERR_HPI_INVALID_DATA;
-    }
-    if (*end != '\0') {
-        KVI_WLOG(KVI_LOG_WARN, "Value has invalid data: %s", text);
-        trace.exitMessage("Error");
-        return SA_ERR_HPI_INVALID_DATA;
-    }
-    return SA_OK;
+    return rc;
 }
 
 SaErrorT kviCsCfgDataInt32Get(const char *Key, SaHpiInt32T *Value,
@@ -628,25 +639,10 @@ SaErrorT kviCsCfgDataInt32Get(const char *Key, SaHpiInt32T *Value,
     KVI_TRACE("Key %s", Key != nullptr ? Key : "(null)");
     KVI_NULL_CHECK(Key);
     KVI_NULL_CHECK(Value);
-    char text[NUMBER_TEXT_SIZE];
-    SaErrorT rc = fetchNumberText(Key, text, CfgContainer);
-    if (rc != SA_OK) {
+    SaErrorT rc = readNumber(Key, Value, CfgContainer, toInt32, __func__);
+    if (rc != SA_OK)
         trace.exitMessage("Error");
-        return rc;
-    }
-    char *end = nullptr;
-    *Value = toInt32(text, &end);
-    if (*Value == INT32_MIN || *Value == INT32_MAX) {
-        KVI_WLOG(KVI_LOG_WARN, "Value out of range: %s", text);
-        trace.exitMessage("Error");
-        return SA_ERR_HPI_INVALID_DATA;
-    }
-    if (*end != '\0') {
-        KVI_WLOG(KVI_LOG_WARN, "Value has invalid data: %s", text);
-        trace.exitMessage("Error");
-        return SA_ERR_HPI_INVALID_DATA;
-    }
-    return SA_OK;
+    return rc;
 }
 
 SaErrorT kviGetListElement(SaHpiUint32T ElementToGet, const char *StringToParse,
@@ -854,38 +850,13 @@ SaErrorT kviCsConfigFinalize(void) noexcept
 // ---------------------------------------------------------------------------
 // Change callbacks and the watcher
 
-namespace
-{
-
-// Registration, unregistration and the watcher act on a container that must
-// have been initialized; its semaphores are not there otherwise.
-SaErrorT resolveLive(KviCsCfgContainer *CfgContainer, KviCsCfgContainer **out)
-{
-    KviCsCfgContainer *cfgContainer = resolve(CfgContainer);
-    if (loadList(cfgContainer) == nullptr) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "cfgContainer->KeyValueList pointer is NULL.");
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    *out = cfgContainer;
-    return SA_OK;
-}
-
-} // namespace
-
 SaErrorT kviCsConfigRegister(KviCsCfgCallback FnPtr, KviCsCfgContainer *CfgContainer) noexcept
 {
     KVI_TRACE("Callback %p", reinterpret_cast<void *>(FnPtr));
     KVI_NULL_CHECK(FnPtr);
-    KviCsCfgContainer *cfgContainer = nullptr;
-    if (SaErrorT rc = resolveLive(CfgContainer, &cfgContainer); rc != SA_OK)
-        return rc;
+    KVI_CFG_LIVE_CONTAINER(cfgContainer, CfgContainer);
 
-    KVI_SEM_GUARD(general, &(cfgContainer->GeneralSem), KVI_CS_CFG_SEM_TIMEOUT);
-    if (!general.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Couldn't acquire semaphore");
-        trace.exitMessage("Error");
-        return SA_ERR_HPI_ERROR;
-    }
+    KVI_CFG_SEM_LOCK(general, &(cfgContainer->GeneralSem));
     KviCsCfgCallbackList *list = cfgContainer->CallbackList;
     for (SaHpiUint32T i = 0; i < cfgContainer->CallbackCount; ++i) {
         if (list->Entry[i] == FnPtr) {
@@ -914,23 +885,11 @@ SaErrorT kviCsConfigUnregister(KviCsCfgCallback FnPtr, KviCsCfgContainer *CfgCon
 {
     KVI_TRACE("Callback %p", reinterpret_cast<void *>(FnPtr));
     KVI_NULL_CHECK(FnPtr);
-    KviCsCfgContainer *cfgContainer = nullptr;
-    if (SaErrorT rc = resolveLive(CfgContainer, &cfgContainer); rc != SA_OK)
-        return rc;
+    KVI_CFG_LIVE_CONTAINER(cfgContainer, CfgContainer);
 
     // DeleteSem first: a callback is never removed while the callbacks run.
-    KVI_SEM_GUARD(deleting, &(cfgContainer->DeleteSem), KVI_CS_CFG_SEM_TIMEOUT);
-    if (!deleting.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Couldn't acquire semaphore");
-        trace.exitMessage("Error");
-        return SA_ERR_HPI_ERROR;
-    }
-    KVI_SEM_GUARD(general, &(cfgContainer->GeneralSem), KVI_CS_CFG_SEM_TIMEOUT);
-    if (!general.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Couldn't acquire semaphore");
-        trace.exitMessage("Error");
-        return SA_ERR_HPI_ERROR;
-    }
+    KVI_CFG_SEM_LOCK(deleting, &(cfgContainer->DeleteSem));
+    KVI_CFG_SEM_LOCK(general, &(cfgContainer->GeneralSem));
     SaHpiUint32T count = cfgContainer->CallbackCount;
     if (count == 0) {
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Attempt to unregister FnPtr when 0 registered");
@@ -954,27 +913,15 @@ SaErrorT kviCsConfigUnregister(KviCsCfgCallback FnPtr, KviCsCfgContainer *CfgCon
 SaErrorT kviCsConfigPerformCallbacks(KviCsCfgContainer *CfgContainer) noexcept
 {
     KVI_TRACE("Container %p", static_cast<void *>(CfgContainer));
-    KviCsCfgContainer *cfgContainer = nullptr;
-    if (SaErrorT rc = resolveLive(CfgContainer, &cfgContainer); rc != SA_OK)
-        return rc;
+    KVI_CFG_LIVE_CONTAINER(cfgContainer, CfgContainer);
 
-    KVI_SEM_GUARD(deleting, &(cfgContainer->DeleteSem), KVI_CS_CFG_SEM_TIMEOUT);
-    if (!deleting.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Couldn't acquire semaphore");
-        trace.exitMessage("Error");
-        return SA_ERR_HPI_ERROR;
-    }
+    KVI_CFG_SEM_LOCK(deleting, &(cfgContainer->DeleteSem));
     // The callbacks run on a copy, outside GeneralSem, so they may register
     // further callbacks and read the configuration.
     KviCsCfgCallback *callbacks = nullptr;
     SaHpiUint32T count = 0;
     {
-        KVI_SEM_GUARD(general, &(cfgContainer->GeneralSem), KVI_CS_CFG_SEM_TIMEOUT);
-        if (!general.held()) {
-            KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Couldn't acquire semaphore");
-            trace.exitMessage("Error");
-            return SA_ERR_HPI_ERROR;
-        }
+        KVI_CFG_SEM_LOCK(general, &(cfgContainer->GeneralSem));
         count = cfgContainer->CallbackCount;
         if (count > 0) {
             callbacks =
@@ -1042,16 +989,9 @@ SaErrorT kviCsConfigProcessChanges(KviCsCfgContainer *CfgContainer) noexcept
 SaErrorT kviCsConfigAddWaitingThread(KviCsCfgContainer *CfgContainer) noexcept
 {
     KVI_TRACE("Container %p", static_cast<void *>(CfgContainer));
-    KviCsCfgContainer *cfgContainer = nullptr;
-    if (SaErrorT rc = resolveLive(CfgContainer, &cfgContainer); rc != SA_OK)
-        return rc;
+    KVI_CFG_LIVE_CONTAINER(cfgContainer, CfgContainer);
 
-    KVI_SEM_GUARD(general, &(cfgContainer->GeneralSem), KVI_CS_CFG_SEM_TIMEOUT);
-    if (!general.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Couldn't acquire semaphore");
-        trace.exitMessage("Error");
-        return SA_ERR_HPI_ERROR;
-    }
+    KVI_CFG_SEM_LOCK(general, &(cfgContainer->GeneralSem));
     if (cfgContainer->HasThread) {
         KVI_ELOG(KVI_LOG_ERR_NONFATAL,
                  "kviCsConfigAddWaitingThread called on config container with thread");

@@ -52,7 +52,42 @@ SaHpiInt32T asLogged(SaHpiUint32T Value) noexcept
     return static_cast<SaHpiInt32T>(Value);
 }
 
+// What every kind of close does to a slot; the id may stay, since a slot
+// without InUse never matches a lookup.
+void freeSlot(KviSessionIdsT &slot) noexcept
+{
+    slot.InUse = SAHPI_FALSE;
+    slot.DomainId = 0;
+    slot.ConnDesc = 0;
+}
+
+// After sessions closed, wakes blocked event readers if any of those sessions
+// was subscribed. The caller has released the table by now, so woken readers
+// can look their session up at once. A failure is logged in the caller's name
+// with the caller's wording for what failed.
+SaErrorT wakeReadersAfterClose(bool anySubscribed, const char *failedCall,
+                               const char *caller) noexcept
+{
+    if (!anySubscribed)
+        return SA_OK;
+    SaErrorT rc = signalReaders();
+    if (rc == SA_OK)
+        return SA_OK;
+    kviCsLogger(__FILE__, __LINE__, caller, KVI_LOG_WARN_NUM, "%s failed.  rc=%d", failedCall, rc);
+    return SA_ERR_HPI_ERROR;
+}
+
 } // namespace
+
+// Refuses an id below the offset, which was never handed out, without taking
+// the table's semaphore.
+#define KVI_SESSION_ID_CHECK(SessionId)                                                            \
+    do {                                                                                           \
+        if ((SessionId) < KVI_CS_SESSION_OFFSET) {                                                 \
+            KVI_DLOG(KVI_LOG_DBG_H, "Invalid session %d passed in. ", asLogged(SessionId));        \
+            return SA_ERR_HPI_INVALID_SESSION;                                                     \
+        }                                                                                          \
+    } while (0)
 
 // Takes the table's semaphore into `guard` for the rest of the scope; a failed
 // wait is logged at LEVEL and leaves the table untouched.
@@ -61,6 +96,22 @@ SaHpiInt32T asLogged(SaHpiUint32T Value) noexcept
     if (!guard.held()) {                                                                           \
         KVI_ELOG(LEVEL, "kviCsSemWait failed.  rc=%d", guard.result());                            \
         return SA_ERR_HPI_ERROR;                                                                   \
+    }
+
+// Finds the open slot of SessionId into `slot`, or ends the call with
+// SA_ERR_HPI_INVALID_SESSION. The lookup matches open slots only; the InUse
+// test keeps a closed slot refused (with CLOSED_TEXT at LEVEL) should that
+// rule ever change.
+#define KVI_SESSION_OPEN_SLOT(slot, LEVEL, CLOSED_TEXT)                                            \
+    const int slot##Index = findSession(SessionId);                                                \
+    if (slot##Index < 0) {                                                                         \
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid Session");                                         \
+        return SA_ERR_HPI_INVALID_SESSION;                                                         \
+    }                                                                                              \
+    KviSessionIdsT &slot = KviCsSessionList[slot##Index];                                          \
+    if (slot.InUse != SAHPI_TRUE) {                                                                \
+        KVI_DLOG(LEVEL, CLOSED_TEXT);                                                              \
+        return SA_ERR_HPI_INVALID_SESSION;                                                         \
     }
 
 extern "C" {
@@ -74,9 +125,7 @@ SaErrorT kviCsSessionInitialize(void) noexcept
     }
     // LastEventRead and nextSession survive: ids already given out stay spent.
     for (KviSessionIdsT &slot : KviCsSessionList) {
-        slot.InUse = SAHPI_FALSE;
-        slot.DomainId = 0;
-        slot.ConnDesc = 0;
+        freeSlot(slot);
         slot.EventSubscribed = SAHPI_FALSE;
         slot.SessionId = 0;
     }
@@ -122,10 +171,7 @@ SaErrorT kviCsSessionOpen(SaHpiDomainIdT DomainId, SaHpiSessionIdT *SessionId) n
 SaErrorT kviCsSessionValidate(SaHpiSessionIdT SessionId) noexcept
 {
     KVI_TRACE("SessionId: %u", SessionId);
-    if (SessionId < KVI_CS_SESSION_OFFSET) {
-        KVI_DLOG(KVI_LOG_DBG_H, "Invalid session %d passed in. ", asLogged(SessionId));
-        return SA_ERR_HPI_INVALID_SESSION;
-    }
+    KVI_SESSION_ID_CHECK(SessionId);
     KVI_SESSION_TABLE_LOCK(table, KVI_LOG_ERR_NONFATAL);
     for (int i = 0; i < KVI_CS_MAX_SESSIONS; i++) {
         const KviSessionIdsT &slot = KviCsSessionList[i];
@@ -143,10 +189,7 @@ SaErrorT kviCsSessionValidate(SaHpiSessionIdT SessionId) noexcept
 SaErrorT kviCsSessionClose(SaHpiSessionIdT SessionId) noexcept
 {
     KVI_TRACE("SessionId: %u", SessionId);
-    if (SessionId < KVI_CS_SESSION_OFFSET) {
-        KVI_DLOG(KVI_LOG_DBG_H, "Invalid session %d passed in. ", asLogged(SessionId));
-        return SA_ERR_HPI_INVALID_SESSION;
-    }
+    KVI_SESSION_ID_CHECK(SessionId);
     KVI_SESSION_TABLE_LOCK(table, KVI_LOG_ERR_NONFATAL);
     const int index = findSession(SessionId);
     if (index < 0) {
@@ -158,21 +201,10 @@ SaErrorT kviCsSessionClose(SaHpiSessionIdT SessionId) noexcept
     KviSessionIdsT &slot = KviCsSessionList[index];
     // EventSubscribed and LastEventRead stay; the next open clears the flag.
     const bool wasSubscribed = slot.EventSubscribed == SAHPI_TRUE;
-    slot.InUse = SAHPI_FALSE;
-    slot.DomainId = 0;
-    slot.ConnDesc = 0;
+    freeSlot(slot);
     slot.SessionId = 0;
-    // Readers woken by the signal look the session up at once, so the
-    // semaphore must be free by then.
     table.release();
-    if (wasSubscribed) {
-        SaErrorT rc = signalReaders();
-        if (rc != SA_OK) {
-            KVI_WLOG(KVI_LOG_WARN, "kviCsSignalEventThreads failed.  rc=%d", rc);
-            return SA_ERR_HPI_ERROR;
-        }
-    }
-    return SA_OK;
+    return wakeReadersAfterClose(wasSubscribed, "kviCsSignalEventThreads", __func__);
 }
 
 SaErrorT kviCsGetDomainFromSession(SaHpiSessionIdT SessionId, SaHpiDomainIdT *Domain) noexcept
@@ -208,18 +240,8 @@ SaErrorT kviCsGetConnectionFromSession(SaHpiSessionIdT SessionId, SaHpiInt32T *C
     KVI_TRACE("SessionId: %u", SessionId);
     KVI_NULL_CHECK(ConnDesc);
     KVI_SESSION_TABLE_LOCK(table, KVI_LOG_WARN);
-    const int index = findSession(SessionId);
-    if (index < 0) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid Session");
-        return SA_ERR_HPI_INVALID_SESSION;
-    }
-    // The lookup matches open slots only; the test below keeps the closed
-    // case refused should that rule ever change.
-    if (KviCsSessionList[index].InUse != SAHPI_TRUE) {
-        KVI_WLOG(KVI_LOG_WARN, "Can't get connection of a closed session!");
-        return SA_ERR_HPI_INVALID_SESSION;
-    }
-    *ConnDesc = KviCsSessionList[index].ConnDesc;
+    KVI_SESSION_OPEN_SLOT(slot, KVI_LOG_WARN, "Can't get connection of a closed session!");
+    *ConnDesc = slot.ConnDesc;
     return SA_OK;
 }
 
@@ -231,21 +253,12 @@ SaErrorT kviCsCloseAllSessionsToConnection(SaHpiInt32T ConnDesc) noexcept
     for (KviSessionIdsT &slot : KviCsSessionList) {
         if (slot.InUse != SAHPI_TRUE || slot.ConnDesc != ConnDesc)
             continue;
-        // The id stays in the slot; without InUse it no longer matches.
-        slot.InUse = SAHPI_FALSE;
-        slot.DomainId = 0;
-        slot.ConnDesc = 0;
+        freeSlot(slot);
         anySubscribed = anySubscribed || slot.EventSubscribed == SAHPI_TRUE;
     }
     table.release();
-    if (anySubscribed) {
-        SaErrorT rc = signalReaders();
-        if (rc != SA_OK) {
-            KVI_WLOG(KVI_LOG_WARN, "kviCsSemWait failed.  rc=%d", rc);
-            return SA_ERR_HPI_ERROR;
-        }
-    }
-    return SA_OK;
+    // The signal's failure is reported as a failed wait here, as it always was.
+    return wakeReadersAfterClose(anySubscribed, "kviCsSemWait", __func__);
 }
 
 SaErrorT kviCsCloseAllSessions(void) noexcept
@@ -260,30 +273,15 @@ SaErrorT kviCsCloseAllSessions(void) noexcept
         anySubscribed = anySubscribed || slot.EventSubscribed == SAHPI_TRUE;
     }
     table.release();
-    if (anySubscribed) {
-        SaErrorT rc = signalReaders();
-        if (rc != SA_OK) {
-            KVI_WLOG(KVI_LOG_WARN, "kviCsSemWait failed.  rc=%d", rc);
-            return SA_ERR_HPI_ERROR;
-        }
-    }
-    return SA_OK;
+    // The signal's failure is reported as a failed wait here, as it always was.
+    return wakeReadersAfterClose(anySubscribed, "kviCsSemWait", __func__);
 }
 
 SaErrorT kviCsSetSessionLastEvent(SaHpiSessionIdT SessionId, SaHpiUint32T LastEventRead) noexcept
 {
     KVI_TRACE("SessionId: %u, LastEventRead: %u", SessionId, LastEventRead);
     KVI_SESSION_TABLE_LOCK(table, KVI_LOG_WARN);
-    const int index = findSession(SessionId);
-    if (index < 0) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid Session");
-        return SA_ERR_HPI_INVALID_SESSION;
-    }
-    KviSessionIdsT &slot = KviCsSessionList[index];
-    if (slot.InUse != SAHPI_TRUE) {
-        KVI_DLOG(KVI_LOG_DBG_H, "Can't set the TimeStamp on a closed session!");
-        return SA_ERR_HPI_INVALID_SESSION;
-    }
+    KVI_SESSION_OPEN_SLOT(slot, KVI_LOG_DBG_H, "Can't set the TimeStamp on a closed session!");
     if (slot.EventSubscribed != SAHPI_TRUE) {
         KVI_DLOG(KVI_LOG_DBG_H, "Can't set the TimeStamp without a subscription!");
         return SA_ERR_HPI_INVALID_REQUEST;
@@ -297,16 +295,7 @@ SaErrorT kviCsGetSessionLastEvent(SaHpiSessionIdT SessionId, SaHpiUint32T *LastE
     KVI_TRACE("SessionId: %u", SessionId);
     KVI_NULL_CHECK(LastEventRead);
     KVI_SESSION_TABLE_LOCK(table, KVI_LOG_WARN);
-    const int index = findSession(SessionId);
-    if (index < 0) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid Session");
-        return SA_ERR_HPI_INVALID_SESSION;
-    }
-    const KviSessionIdsT &slot = KviCsSessionList[index];
-    if (slot.InUse != SAHPI_TRUE) {
-        KVI_DLOG(KVI_LOG_DBG_H, "Can't get the TimeStamp from a closed session!");
-        return SA_ERR_HPI_INVALID_SESSION;
-    }
+    KVI_SESSION_OPEN_SLOT(slot, KVI_LOG_DBG_H, "Can't get the TimeStamp from a closed session!");
     if (slot.EventSubscribed != SAHPI_TRUE) {
         KVI_DLOG(KVI_LOG_DBG_H, "Can't get the TimeStamp without a subscription!");
         return SA_ERR_HPI_INVALID_REQUEST;
@@ -321,16 +310,7 @@ SaErrorT kviCsSetSessionEventSubscription(SaHpiSessionIdT SessionId, SaHpiBoolT 
     KVI_TRACE("SessionId: %u, EventSubscribe: %d, LastEventRead: %u", SessionId, EventSubscribe,
               LastEventRead);
     KVI_SESSION_TABLE_LOCK(table, KVI_LOG_WARN);
-    const int index = findSession(SessionId);
-    if (index < 0) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid Session");
-        return SA_ERR_HPI_INVALID_SESSION;
-    }
-    KviSessionIdsT &slot = KviCsSessionList[index];
-    if (slot.InUse != SAHPI_TRUE) {
-        KVI_DLOG(KVI_LOG_DBG_H, "Can't set subscription state on a closed session!");
-        return SA_ERR_HPI_INVALID_SESSION;
-    }
+    KVI_SESSION_OPEN_SLOT(slot, KVI_LOG_DBG_H, "Can't set subscription state on a closed session!");
     // Any non-zero request subscribes, so the stored flag is always a
     // proper boolean and the comparison below means what it says.
     const SaHpiBoolT requested = EventSubscribe ? SAHPI_TRUE : SAHPI_FALSE;
@@ -353,16 +333,8 @@ SaErrorT kviCsGetSessionEventSubscription(SaHpiSessionIdT SessionId,
     KVI_TRACE("SessionId: %u", SessionId);
     KVI_NULL_CHECK(EventSubscribe);
     KVI_SESSION_TABLE_LOCK(table, KVI_LOG_WARN);
-    const int index = findSession(SessionId);
-    if (index < 0) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid Session");
-        return SA_ERR_HPI_INVALID_SESSION;
-    }
-    const KviSessionIdsT &slot = KviCsSessionList[index];
-    if (slot.InUse != SAHPI_TRUE) {
-        KVI_DLOG(KVI_LOG_DBG_H, "Can't get the subscription state of a closed session!");
-        return SA_ERR_HPI_INVALID_SESSION;
-    }
+    KVI_SESSION_OPEN_SLOT(slot, KVI_LOG_DBG_H,
+                          "Can't get the subscription state of a closed session!");
     *EventSubscribe = slot.EventSubscribed;
     return SA_OK;
 }
