@@ -6,10 +6,11 @@
 #include <atomic>
 #include <chrono>
 #include <cstring>
+#include <ctime>
 #include <functional>
 #include <string>
 #include <thread>
-#include <utility>
+#include <tuple>
 #include <vector>
 
 #include <sys/time.h>
@@ -23,49 +24,25 @@ namespace
 using Clock = std::chrono::steady_clock;
 using namespace std::chrono_literals;
 
-long long msSince(Clock::time_point start)
+// Moves a file's modification time back by whole seconds: a change the
+// watcher sees at once, without waiting for the clock's next second.
+void backdate(const std::string &path)
 {
-    return std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - start).count();
-}
-
-// Moves a file's modification time by whole seconds: a change the watcher
-// sees at once, without waiting for the clock's next second.
-void shiftModificationTime(const std::string &path, long seconds)
-{
-    SaHpiInt64T modified = 0;
-    ASSERT_EQ(kviCsGetFileInfo(path.c_str(), &modified, nullptr), SA_OK);
-    struct timeval times[2];
-    times[0].tv_sec = times[1].tv_sec = static_cast<time_t>(modified / 1000000000LL) + seconds;
-    times[0].tv_usec = times[1].tv_usec = 0;
+    struct timeval times[2] = {{time(nullptr) - 100, 0}, {time(nullptr) - 100, 0}};
     ASSERT_EQ(utimes(path.c_str(), times), 0);
 }
 
 bool waitFor(const std::function<bool()> &done, std::chrono::milliseconds limit)
 {
-    auto deadline = Clock::now() + limit;
-    while (!done()) {
+    for (auto deadline = Clock::now() + limit; !done(); std::this_thread::sleep_for(10ms))
         if (Clock::now() > deadline)
             return false;
-        std::this_thread::sleep_for(10ms);
-    }
     return true;
 }
 
-// Finalization refuses a container whose callbacks are running at that very
-// moment (a watcher that reloads every second), and the caller tries again.
-SaErrorT finalizeWhenIdle(KviCsCfgContainer *container)
-{
-    SaErrorT rc = SA_OK;
-    for (int attempt = 0; attempt < 50; ++attempt) {
-        rc = kviCsConfigFinalizeStrucure(container);
-        if (rc != SA_ERR_HPI_INVALID_REQUEST)
-            break;
-        std::this_thread::sleep_for(std::chrono::milliseconds(5));
-    }
-    return rc;
-}
-
-// A container loaded from a file of its own.
+// A container loaded from a file of its own. Finalization refuses a container
+// whose callbacks run at that moment (a watcher reloads every second), so
+// tearing down tries again.
 class ContainerTest : public testing::Test
 {
   protected:
@@ -73,13 +50,13 @@ class ContainerTest : public testing::Test
     {
         path_ = dir_.write("kvi.conf", text);
         ASSERT_EQ(kviCsConfigInitStructure(&cont_, watch, path_.c_str()), SA_OK);
-        loaded_ = true;
     }
     void TearDown() override
     {
-        if (loaded_) {
-            EXPECT_EQ(finalizeWhenIdle(&cont_), SA_OK);
-        }
+        for (int i = 0; cont_.Filename != nullptr && i < 50; ++i)
+            if (kviCsConfigFinalizeStrucure(&cont_) != SA_OK)
+                std::this_thread::sleep_for(5ms);
+        EXPECT_EQ(cont_.Filename, nullptr); // finalized, which zeroes it
     }
     std::string get(const char *key)
     {
@@ -91,217 +68,179 @@ class ContainerTest : public testing::Test
     KviTempDir dir_;
     std::string path_;
     KviCsCfgContainer cont_{};
-    bool loaded_ = false;
 };
+
+std::vector<int> calls;
+template <int N> void record()
+{
+    calls.push_back(N);
+}
+template <int... N>
+std::array<KviCsCfgCallback, sizeof...(N)> recorders(std::integer_sequence<int, N...>)
+{
+    return {record<N>...};
+}
+const auto callback = recorders(std::make_integer_sequence<int, 12>{});
 
 // Queries --------------------------------------------------------------------
 
 using KviConfigQuery = ContainerTest;
 
-TEST_F(KviConfigQuery, FirstOfDuplicateKeysWinsAndKeysAreExact)
+TEST_F(KviConfigQuery, FirstExactKeyWinsAndTheValueIsCutToTheBuffer)
 {
-    load("dup = \"first\"\ndup = \"second\"\nKey = \"upper\"\n");
+    load("dup = \"first\"\ndup = \"second\"\nKey = \"upper\"\nk = \"abcd\"\n");
     EXPECT_EQ(get("dup"), "first");
     EXPECT_EQ(get("Key"), "upper");
     KviLogCapture log(KVI_LOG_DBG_L_NUM | KVI_LOG_FUNC_OUT_NUM);
-    char value[8];
-    EXPECT_EQ(kviCsCfgDataGet("key", sizeof value, value, &cont_), SA_ERR_HPI_NOT_PRESENT);
-    EXPECT_EQ(kviCsCfgDataGet("Ke", sizeof value, value, &cont_), SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_EQ(get("key"), "rc -1013");
+    EXPECT_EQ(get("Ke"), "rc -1013");
+    // Size, result and the buffer afterwards (one guard byte 'X' more):
+    // padded with NULs, or cut without a terminator.
+    const std::tuple<SaHpiUint32T, SaErrorT, std::string> cases[] = {
+        {8, SA_OK, std::string("abcd\0\0\0\0X", 9)},
+        {5, SA_OK, std::string("abcd\0X", 6)},
+        {4, SA_ERR_HPI_DATA_TRUNCATED, "abcdX"},
+        {0, SA_ERR_HPI_DATA_TRUNCATED, "X"},
+    };
+    for (const auto &[size, rc, after] : cases) {
+        SCOPED_TRACE(size);
+        char value[9];
+        memset(value, 'X', sizeof value);
+        EXPECT_EQ(kviCsCfgDataGet("k", size, value, &cont_), rc);
+        EXPECT_EQ(std::string(value, after.size()), after);
+    }
+    EXPECT_TRUE(log.contains("Size is 4+1 of 8"));
+    EXPECT_TRUE(log.contains("Truncated"));
     EXPECT_TRUE(log.contains("Not present"));
 }
 
-TEST_F(KviConfigQuery, ValueThatFillsTheBufferIsTruncatedWithoutTerminator)
+TEST_F(KviConfigQuery, NumbersAreRefusedWhenSaturatedOrFollowedByGarbage)
 {
-    load("k = \"abcd\"\n");
-    KviLogCapture log;
-    char value[9];
-    memset(value, 'X', sizeof value);
-    EXPECT_EQ(kviCsCfgDataGet("k", 8, value, &cont_), SA_OK);
-    EXPECT_EQ(std::string(value, 9), std::string("abcd\0\0\0\0X", 9)); // padded with NULs
-    EXPECT_TRUE(log.contains("Size is 4+1 of 8"));
-
-    memset(value, 'X', sizeof value);
-    EXPECT_EQ(kviCsCfgDataGet("k", 5, value, &cont_), SA_OK);
-    EXPECT_EQ(std::string(value, 6), std::string("abcd\0X", 6));
-
-    memset(value, 'X', sizeof value);
-    EXPECT_EQ(kviCsCfgDataGet("k", 4, value, &cont_), SA_ERR_HPI_DATA_TRUNCATED);
-    EXPECT_EQ(std::string(value, 5), "abcdX");
-    EXPECT_TRUE(log.contains("Truncated"));
-    EXPECT_EQ(kviCsCfgDataGet("k", 0, value, &cont_), SA_ERR_HPI_DATA_TRUNCATED);
-    EXPECT_EQ(value[0], 'a');
-}
-
-TEST_F(KviConfigQuery, NullArgumentsAndTheDefaultContainerBeforeInit)
-{
-    load("k = \"1\"\n");
-    KviLogCapture log;
-    char value[8];
-    SaHpiUint32T u = 0;
-    SaHpiInt32T s = 0;
-    EXPECT_EQ(kviCsCfgDataGet(nullptr, 8, value, &cont_), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("Key pointer is NULL."));
-    EXPECT_EQ(kviCsCfgDataGet("k", 8, nullptr, &cont_), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("Value pointer is NULL."));
-    EXPECT_EQ(kviCsCfgDataUint32Get(nullptr, &u, &cont_), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsCfgDataUint32Get("k", nullptr, &cont_), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsCfgDataInt32Get(nullptr, &s, &cont_), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsCfgDataInt32Get("k", nullptr, &cont_), SA_ERR_HPI_INVALID_PARAMS);
-
-    // The default container was never initialized: refused, not a crash.
-    log.clear();
-    EXPECT_EQ(kviCsCfgDataGet("k", 8, value, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("cfgContainer->KeyValueList pointer is NULL."));
-    EXPECT_EQ(kviCsCfgDataUint32Get("k", &u, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsCfgDataInt32Get("k", &s, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-}
-
-TEST_F(KviConfigQuery, UnsignedNumbers)
-{
-    load("max = \"4294967295\"\nminus2 = \"-2\"\nblank = \"12 \"\nletters = \"12ab\"\n"
-         "empty = \"\"\nhex = \"0x10\"\noctal = \"010\"\nlead = \"  7\"\n"
-         "twelve = \"123456789012\"\nhuge = \"99999999999\"\nwrap = \"-4294967295\"\n"
-         "hexmax = \"0xFFFFFFFF\"\nbelow = \"4294967294\"\nplus = \"+5\"\n");
-    struct Case {
-        const char *key;
-        SaErrorT rc;
-        SaHpiUint32T value;
-        const char *message;
-    };
-    const Case cases[] = {
-        {"max", SA_ERR_HPI_INVALID_DATA, 0xFFFFFFFFu, "Value out of range: 4294967295"},
-        {"minus2", SA_OK, 4294967294u, nullptr},
-        {"blank", SA_OK, 12, nullptr},
-        {"letters", SA_ERR_HPI_INVALID_DATA, 12, "Value has invalid data: 12ab"},
-        {"empty", SA_OK, 0, nullptr},
-        {"hex", SA_OK, 16, nullptr},
-        {"octal", SA_OK, 8, nullptr},
-        {"lead", SA_OK, 7, nullptr},
-        {"twelve", SA_ERR_HPI_DATA_TRUNCATED, 99, nullptr},
+    const char *range = "out of range";
+    const char *garbage = "has invalid data";
+    // Signed?, text, result, value (99: left alone), the warning's wording.
+    const std::tuple<bool, const char *, SaErrorT, long long, const char *> cases[] = {
+        {false, "4294967295", SA_ERR_HPI_INVALID_DATA, 0xFFFFFFFFu, range},
+        {false, "4294967294", SA_OK, 4294967294u, nullptr},
+        {false, "-2", SA_OK, 4294967294u, nullptr},
+        {false, "12 ", SA_OK, 12, nullptr},
+        {false, "12ab", SA_ERR_HPI_INVALID_DATA, 12, garbage},
+        {false, "", SA_OK, 0, nullptr},
+        {false, "0x10", SA_OK, 16, nullptr},
+        {false, "010", SA_OK, 8, nullptr},
+        {false, "123456789012", SA_ERR_HPI_DATA_TRUNCATED, 99, nullptr},
         // As where long has 32 bits: too large saturates, and is refused.
-        {"huge", SA_ERR_HPI_INVALID_DATA, 0xFFFFFFFFu, "Value out of range: 99999999999"},
-        {"wrap", SA_OK, 1, nullptr},
-        {"hexmax", SA_ERR_HPI_INVALID_DATA, 0xFFFFFFFFu, "Value out of range: 0xFFFFFFFF"},
-        {"below", SA_OK, 4294967294u, nullptr},
-        {"plus", SA_OK, 5, nullptr},
-        {"absent", SA_ERR_HPI_NOT_PRESENT, 99, nullptr},
+        {false, "99999999999", SA_ERR_HPI_INVALID_DATA, 0xFFFFFFFFu, range},
+        {false, "-4294967295", SA_OK, 1, nullptr},
+        {true, "2147483647", SA_ERR_HPI_INVALID_DATA, INT32_MAX, range},
+        {true, "-2147483648", SA_ERR_HPI_INVALID_DATA, INT32_MIN, range},
+        {true, "2147483646", SA_OK, 2147483646, nullptr},
+        {true, "-2147483647", SA_OK, -2147483647, nullptr},
+        {true, "3000000000", SA_ERR_HPI_INVALID_DATA, INT32_MAX, range},
+        {true, "0x7fffffff", SA_ERR_HPI_INVALID_DATA, INT32_MAX, range},
+        {true, "1.5", SA_ERR_HPI_INVALID_DATA, 1, garbage},
+        {true, "-0x10\t", SA_OK, -16, nullptr},
     };
-    for (const auto &c : cases) {
-        SCOPED_TRACE(c.key);
+    std::string file;
+    for (size_t i = 0; i < std::size(cases); ++i)
+        file += "k" + std::to_string(i) + " = \"" + std::get<1>(cases[i]) + "\"\n";
+    load(file);
+    for (size_t i = 0; i < std::size(cases); ++i) {
+        const auto &[isSigned, text, rc, value, problem] = cases[i];
+        SCOPED_TRACE(std::string(isSigned ? "signed " : "unsigned ") + text);
+        const std::string key = "k" + std::to_string(i);
         KviLogCapture log;
-        SaHpiUint32T value = 99;
-        EXPECT_EQ(kviCsCfgDataUint32Get(c.key, &value, &cont_), c.rc);
-        EXPECT_EQ(value, c.value);
-        if (c.message != nullptr) {
-            EXPECT_TRUE(log.contains(c.message));
-        }
+        SaHpiUint32T u = 99;
+        SaHpiInt32T s = 99;
+        EXPECT_EQ(isSigned ? kviCsCfgDataInt32Get(key.c_str(), &s, &cont_)
+                           : kviCsCfgDataUint32Get(key.c_str(), &u, &cont_),
+                  rc);
+        EXPECT_EQ(isSigned ? static_cast<long long>(s) : static_cast<long long>(u), value);
+        if (problem == nullptr)
+            continue;
+        // The warning names the query that was called.
+        auto lines = log.matching(std::string("Value ") + problem + ": " + text);
+        ASSERT_EQ(lines.size(), 1u);
+        EXPECT_NE(lines[0].find(isSigned ? " kviCsCfgDataInt32Get()" : " kviCsCfgDataUint32Get()"),
+                  std::string::npos);
     }
+    SaHpiUint32T u = 99;
+    EXPECT_EQ(kviCsCfgDataUint32Get("absent", &u, &cont_), SA_ERR_HPI_NOT_PRESENT);
 }
 
-TEST_F(KviConfigQuery, SignedNumbers)
-{
-    load("max = \"2147483647\"\nmin = \"-2147483648\"\nnear = \"2147483646\"\n"
-         "neg = \"-5\"\nbig = \"3000000000\"\nhexmax = \"0x7fffffff\"\nfrac = \"1.5\"\n"
-         "tab = \"-0x10\t\"\nnearmin = \"-2147483647\"\n");
-    struct Case {
-        const char *key;
-        SaErrorT rc;
-        SaHpiInt32T value;
-        const char *message;
-    };
-    const Case cases[] = {
-        {"max", SA_ERR_HPI_INVALID_DATA, INT32_MAX, "Value out of range: 2147483647"},
-        {"min", SA_ERR_HPI_INVALID_DATA, INT32_MIN, "Value out of range: -2147483648"},
-        {"near", SA_OK, 2147483646, nullptr},
-        {"nearmin", SA_OK, -2147483647, nullptr},
-        {"neg", SA_OK, -5, nullptr},
-        {"big", SA_ERR_HPI_INVALID_DATA, INT32_MAX, "Value out of range: 3000000000"},
-        {"hexmax", SA_ERR_HPI_INVALID_DATA, INT32_MAX, "Value out of range: 0x7fffffff"},
-        {"frac", SA_ERR_HPI_INVALID_DATA, 1, "Value has invalid data: 1.5"},
-        {"tab", SA_OK, -16, nullptr},
-    };
-    for (const auto &c : cases) {
-        SCOPED_TRACE(c.key);
-        KviLogCapture log;
-        SaHpiInt32T value = 99;
-        EXPECT_EQ(kviCsCfgDataInt32Get(c.key, &value, &cont_), c.rc);
-        EXPECT_EQ(value, c.value);
-        if (c.message != nullptr) {
-            EXPECT_TRUE(log.contains(c.message));
-        }
-    }
-}
-
-TEST(KviConfigListElement, ElementsOfASemicolonList)
+TEST(KviConfigListElement, ElementsOfASemicolonListAndBufferLimits)
 {
     KviLogCapture log;
-    char out[16];
     struct Case {
         const char *list;
-        SaHpiUint32T element;
+        SaHpiUint32T element, size;
         SaErrorT rc;
         const char *value;
     };
     const Case cases[] = {
-        {"a;b;", 0, SA_OK, "a"},
-        {"a;b;", 1, SA_OK, "b"},
-        {"a;b;", 2, SA_OK, ""},
-        {"a;b;", 3, SA_ERR_HPI_NOT_PRESENT, nullptr},
-        {"a;;b", 1, SA_OK, ""},
-        {"a;;b", 2, SA_OK, "b"},
-        {"", 0, SA_OK, ""},
-        {"", 1, SA_ERR_HPI_NOT_PRESENT, nullptr},
-        {" lib1.so ; lib2.so", 1, SA_OK, " lib2.so"},
+        {"a;b;", 0, 16, SA_OK, "a"},
+        {"a;b;", 1, 16, SA_OK, "b"},
+        {"a;b;", 2, 16, SA_OK, ""},
+        {"a;b;", 3, 16, SA_ERR_HPI_NOT_PRESENT, nullptr},
+        {"a;;b", 1, 16, SA_OK, ""},
+        {"a;;b", 2, 16, SA_OK, "b"},
+        {"", 0, 16, SA_OK, ""},
+        {"", 1, 16, SA_ERR_HPI_NOT_PRESENT, nullptr},
+        {" lib1.so ; lib2.so", 1, 16, SA_OK, " lib2.so"},
+        {"abc;d", 0, 4, SA_OK, "abc"},
+        {"abcd;e", 0, 4, SA_ERR_HPI_OUT_OF_SPACE, nullptr},
+        {"a", 0, 2, SA_OK, "a"},
+        {"a", 0, 1, SA_ERR_HPI_INVALID_PARAMS, nullptr},
     };
     for (const auto &c : cases) {
         SCOPED_TRACE(std::string(c.list) + " #" + std::to_string(c.element));
-        EXPECT_EQ(kviGetListElement(c.element, c.list, sizeof out, out), c.rc);
+        char out[16];
+        EXPECT_EQ(kviGetListElement(c.element, c.list, c.size, out), c.rc);
         if (c.value != nullptr) {
             EXPECT_STREQ(out, c.value);
         }
     }
     EXPECT_TRUE(log.contains("Result String is b"));
+    EXPECT_TRUE(log.contains("Parameter ResultMaxSize=4 is too small"));
+    EXPECT_TRUE(log.contains("ResultMaxSize is 1.  How can anyone put a module name in that!?"));
 }
 
-TEST(KviConfigListElement, ResultBufferLimits)
+void ignoredCallback() {}
+
+#define CALL(function, ...) [&] { return function(__VA_ARGS__); }
+
+TEST(KviConfigArguments, NullPointersAndAnUninitializedDefaultContainerAreRefused)
 {
     KviLogCapture log;
-    char out[8];
-    EXPECT_EQ(kviGetListElement(0, "abc;d", 4, out), SA_OK);
-    EXPECT_STREQ(out, "abc");
-    EXPECT_EQ(kviGetListElement(0, "abcd;e", 4, out), SA_ERR_HPI_OUT_OF_SPACE);
-    EXPECT_TRUE(log.contains("Parameter ResultMaxSize=4 is too small"));
-    EXPECT_EQ(kviGetListElement(0, "a", 2, out), SA_OK);
-    EXPECT_EQ(kviGetListElement(0, "a", 1, out), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("ResultMaxSize is 1.  How can anyone put a module name in that!?"));
-    EXPECT_EQ(kviGetListElement(0, nullptr, 8, out), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("StringToParse pointer is NULL."));
-    EXPECT_EQ(kviGetListElement(0, "a", 8, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("Result pointer is NULL."));
+    KviCsCfgContainer cont{};
+    char buf[8];
+    const char *uninitialized = "cfgContainer->KeyValueList pointer is NULL.";
+    const std::pair<std::function<SaErrorT()>, const char *> cases[] = {
+        {CALL(kviCsCfgDataGet, nullptr, 8, buf, &cont), "Key pointer is NULL."},
+        {CALL(kviCsCfgDataInt32Get, "k", nullptr, &cont), "Value pointer is NULL."},
+        {CALL(kviGetListElement, 0, nullptr, 8, buf), "StringToParse pointer is NULL."},
+        {CALL(kviCsConfigInitStructure, nullptr, 0, "x"), "ConfigContainer pointer is NULL."},
+        {CALL(kviCsConfigFinalizeStrucure, &cont), "CfgContainer->Filename pointer is NULL."},
+        {CALL(kviCsConfigRegister, nullptr, &cont), "FnPtr pointer is NULL."},
+        {CALL(kviCsConfigLoadValues, &cont), "ConfigContainer->Filename pointer is NULL."},
+        {CALL(kviCsCfgDataParseData, "a", 1, nullptr), "CfgCont pointer is NULL."},
+        {CALL(kviCsCfgDataParseKeyValuePair, "a", 1, 1, nullptr, &cont), "Index pointer is NULL."},
+        // The default container was never initialized: refused, not a crash.
+        {CALL(kviCsCfgDataGet, "k", 8, buf, nullptr), uninitialized},
+        {CALL(kviCsConfigRegister, ignoredCallback, nullptr), uninitialized},
+        {CALL(kviCsConfigAddWaitingThread, nullptr), uninitialized},
+    };
+    for (const auto &[call, message] : cases) {
+        SCOPED_TRACE(message);
+        log.clear();
+        EXPECT_EQ(call(), SA_ERR_HPI_INVALID_PARAMS);
+        EXPECT_TRUE(log.contains(message));
+    }
+    EXPECT_EQ(kviCsThreadRoutine(nullptr), nullptr);
+    EXPECT_TRUE(log.contains("CfgContainer is NULL"));
 }
 
 // Containers -----------------------------------------------------------------
-
-TEST(KviConfigContainer, InitializationRefusesBadArgumentsAndMissingFiles)
-{
-    KviLogCapture log;
-    KviTempDir dir;
-    KviCsCfgContainer cont;
-    SaHpiInt32T base = kviTestLiveBlocks();
-    EXPECT_EQ(kviCsConfigInitStructure(nullptr, SAHPI_FALSE, "x"), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("ConfigContainer pointer is NULL."));
-    EXPECT_EQ(kviCsConfigInitStructure(&cont, SAHPI_FALSE, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("FileName pointer is NULL."));
-
-    std::string missing = dir.file("missing.conf");
-    EXPECT_EQ(kviCsConfigInitStructure(&cont, SAHPI_TRUE, missing.c_str()), SA_ERR_HPI_ERROR);
-    EXPECT_TRUE(log.contains("kviCsConfigLoadValues failed for file " + missing));
-    EXPECT_EQ(cont.KeyValueList, nullptr);
-    EXPECT_EQ(cont.Filename, nullptr);
-    EXPECT_EQ(cont.CallbackList, nullptr);
-    EXPECT_FALSE(cont.HasThread);
-    EXPECT_EQ(kviTestLiveBlocks(), base);
-}
 
 TEST(KviConfigContainer, EveryAllocationFailureIsUndoneWithoutLeaks)
 {
@@ -318,8 +257,7 @@ TEST(KviConfigContainer, EveryAllocationFailureIsUndoneWithoutLeaks)
         kviCsMemoryFailNthAllocation(nth);
         SaErrorT rc = kviCsConfigInitStructure(&cont, SAHPI_TRUE, path.c_str());
         kviCsMemoryFailNthAllocation(0);
-        bool pairBlock = nth > 4 && nth < allocations;
-        if (pairBlock || nth > allocations) {
+        if ((nth > 4 && nth < allocations) || nth > allocations) {
             // A pair that could not be stored is lost; the rest loads.
             ASSERT_EQ(rc, SA_OK);
             EXPECT_TRUE(cont.HasThread);
@@ -333,9 +271,18 @@ TEST(KviConfigContainer, EveryAllocationFailureIsUndoneWithoutLeaks)
     EXPECT_TRUE(log.contains("Malloc failed"));
     EXPECT_TRUE(log.contains("Unable to load config file " + path));
     EXPECT_TRUE(log.contains("Unable to malloc space!"));
+
+    // A missing file is undone the same way, watcher and all.
+    KviCsCfgContainer cont;
+    std::string missing = dir.file("missing.conf");
+    EXPECT_EQ(kviCsConfigInitStructure(&cont, SAHPI_TRUE, missing.c_str()), SA_ERR_HPI_ERROR);
+    EXPECT_TRUE(log.contains("kviCsConfigLoadValues failed for file " + missing));
+    EXPECT_TRUE(cont.KeyValueList == nullptr && cont.Filename == nullptr &&
+                cont.CallbackList == nullptr && !cont.HasThread);
+    EXPECT_EQ(kviTestLiveBlocks(), base);
 }
 
-TEST(KviConfigContainer, FinalizationRefusesAContainerInUse)
+TEST(KviConfigContainer, FinalizationRefusesAContainerInUseAndFreesCallbacksLeft)
 {
     KviLogCapture log;
     KviTempDir dir;
@@ -343,46 +290,25 @@ TEST(KviConfigContainer, FinalizationRefusesAContainerInUse)
     SaHpiInt32T base = kviTestLiveBlocks();
     KviCsCfgContainer cont;
     ASSERT_EQ(kviCsConfigInitStructure(&cont, SAHPI_FALSE, path.c_str()), SA_OK);
-
-    ASSERT_EQ(KVI_CS_SEM_WAIT(&cont.DeleteSem, 0), SA_OK);
-    EXPECT_EQ(kviCsConfigFinalizeStrucure(&cont), SA_ERR_HPI_INVALID_REQUEST);
+    for (KviCsSemaphore *sem : {&cont.DeleteSem, &cont.GeneralSem}) {
+        ASSERT_EQ(KVI_CS_SEM_WAIT(sem, 0), SA_OK);
+        EXPECT_EQ(kviCsConfigFinalizeStrucure(&cont), SA_ERR_HPI_INVALID_REQUEST);
+        ASSERT_EQ(KVI_CS_SEM_POST(sem), SA_OK);
+    }
     EXPECT_TRUE(log.contains("DeleteSem is locked.  No other thread should be using it"));
-    ASSERT_EQ(KVI_CS_SEM_POST(&cont.DeleteSem), SA_OK);
-
-    ASSERT_EQ(KVI_CS_SEM_WAIT(&cont.GeneralSem, 0), SA_OK);
-    EXPECT_EQ(kviCsConfigFinalizeStrucure(&cont), SA_ERR_HPI_INVALID_REQUEST);
     EXPECT_TRUE(log.contains("GeneralSem is locked.  No other thread should be using it"));
-    ASSERT_EQ(KVI_CS_SEM_POST(&cont.GeneralSem), SA_OK);
 
     // Both refusals left the container whole and usable.
     char value[4];
     EXPECT_EQ(kviCsCfgDataGet("a", sizeof value, value, &cont), SA_OK);
-    EXPECT_EQ(kviCsConfigFinalizeStrucure(&cont), SA_OK);
-    EXPECT_EQ(kviTestLiveBlocks(), base);
-
-    // Finalizing zeroes the container, so a second finalization is refused.
-    EXPECT_EQ(kviCsConfigFinalizeStrucure(&cont), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("CfgContainer->Filename pointer is NULL."));
-    EXPECT_EQ(kviCsConfigFinalizeStrucure(nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("CfgContainer pointer is NULL."));
-}
-
-void ignoredCallback() {}
-
-TEST(KviConfigContainer, FinalizationWithCallbacksLeftComplainsAndFreesAll)
-{
-    KviLogCapture log;
-    KviTempDir dir;
-    std::string path = dir.write("kvi.conf", "a = \"1\"\n");
-    SaHpiInt32T base = kviTestLiveBlocks();
-    KviCsCfgContainer cont;
-    ASSERT_EQ(kviCsConfigInitStructure(&cont, SAHPI_FALSE, path.c_str()), SA_OK);
     ASSERT_EQ(kviCsConfigRegister(ignoredCallback, &cont), SA_OK);
     EXPECT_EQ(kviCsConfigFinalizeStrucure(&cont), SA_OK);
     EXPECT_TRUE(log.contains(
         "Callback count isn't zero! Callbacks should have all been unregistered! Count = 1"));
     EXPECT_TRUE(log.contains("CallbackList freed"));
     EXPECT_EQ(kviTestLiveBlocks(), base);
+    // Finalizing zeroes the container, so a second finalization is refused.
+    EXPECT_EQ(kviCsConfigFinalizeStrucure(&cont), SA_ERR_HPI_INVALID_PARAMS);
 }
 
 TEST(KviConfigContainer, DefaultContainerLifecycle)
@@ -391,65 +317,44 @@ TEST(KviConfigContainer, DefaultContainerLifecycle)
     KviTempDir dir;
     std::string path = dir.write("kvi.conf", "max_mapl_count = \"8\"\n");
     SaHpiInt32T base = kviTestLiveBlocks();
+    SaHpiUint32T count = 0;
 
-    EXPECT_EQ(kviCsConfigInit(SAHPI_FALSE, nullptr), SA_ERR_HPI_INVALID_PARAMS);
     EXPECT_EQ(kviCsConfigInit(SAHPI_FALSE, dir.file("missing").c_str()), SA_ERR_HPI_ERROR);
     EXPECT_TRUE(log.contains("kviCsConfigInitStructure failed -1001"));
-    SaHpiUint32T count = 0;
     EXPECT_EQ(kviCsCfgDataUint32Get("max_mapl_count", &count, nullptr), SA_ERR_HPI_INVALID_PARAMS);
 
-    ASSERT_EQ(kviCsConfigInit(SAHPI_TRUE, path.c_str()), SA_OK);
-    EXPECT_EQ(kviCsCfgDataUint32Get("max_mapl_count", &count, nullptr), SA_OK);
-    EXPECT_EQ(count, 8u);
-    // A second initialization would lose the live container.
-    EXPECT_EQ(kviCsConfigInit(SAHPI_FALSE, path.c_str()), SA_ERR_HPI_DUPLICATE);
-    EXPECT_EQ(kviCsConfigAddWaitingThread(nullptr), SA_ERR_HPI_DUPLICATE);
-
-    EXPECT_EQ(kviCsConfigFinalize(), SA_OK);
-    EXPECT_EQ(kviTestLiveBlocks(), base);
-    EXPECT_EQ(kviCsCfgDataUint32Get("max_mapl_count", &count, nullptr), SA_ERR_HPI_INVALID_PARAMS);
+    for (int round = 0; round < 2; ++round) { // it can be initialized again
+        ASSERT_EQ(kviCsConfigInit(round == 0 ? SAHPI_TRUE : SAHPI_FALSE, path.c_str()), SA_OK);
+        EXPECT_EQ(kviCsCfgDataUint32Get("max_mapl_count", &count, nullptr), SA_OK);
+        EXPECT_EQ(count, 8u);
+        // A second initialization would lose the live container.
+        EXPECT_EQ(kviCsConfigInit(SAHPI_FALSE, path.c_str()), SA_ERR_HPI_DUPLICATE);
+        EXPECT_EQ(kviCsConfigAddWaitingThread(nullptr), round == 0 ? SA_ERR_HPI_DUPLICATE : SA_OK);
+        EXPECT_EQ(kviCsConfigFinalize(), SA_OK);
+        EXPECT_EQ(kviTestLiveBlocks(), base);
+        EXPECT_EQ(kviCsCfgDataUint32Get("max_mapl_count", &count, nullptr),
+                  SA_ERR_HPI_INVALID_PARAMS);
+    }
     // Finalizing what is not there is only logged.
     EXPECT_EQ(kviCsConfigFinalize(), SA_OK);
     EXPECT_TRUE(log.contains("kviCsConfigFinalizeStrucure for default container failed -1011"));
-    EXPECT_EQ(kviCsConfigRegister(ignoredCallback, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsConfigUnregister(ignoredCallback, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsConfigAddWaitingThread(nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsConfigProcessChanges(nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("CfgContainer pointer is NULL."));
-
-    // And it can be initialized again.
-    ASSERT_EQ(kviCsConfigInit(SAHPI_FALSE, path.c_str()), SA_OK);
-    EXPECT_EQ(kviCsConfigFinalize(), SA_OK);
-    EXPECT_EQ(kviTestLiveBlocks(), base);
 }
 
 // Callbacks ------------------------------------------------------------------
 
-std::vector<int> calls;
-template <int N> void record()
-{
-    calls.push_back(N);
-}
-template <int... N>
-std::array<KviCsCfgCallback, sizeof...(N)> recorders(std::integer_sequence<int, N...>)
-{
-    return {record<N>...};
-}
-const auto callback = recorders(std::make_integer_sequence<int, 12>{});
-
 using KviConfigCallbacks = ContainerTest;
 
-TEST_F(KviConfigCallbacks, RegistrationRefusesDuplicatesAndGrowsAtTheEleventh)
+TEST_F(KviConfigCallbacks, RegistrationGrowsAtTheEleventhAndUnregisteringFillsTheGap)
 {
     load("a = \"1\"\n");
     KviLogCapture log;
-    EXPECT_EQ(kviCsConfigRegister(nullptr, &cont_), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("FnPtr pointer is NULL."));
-    ASSERT_EQ(kviCsConfigRegister(callback[0], &cont_), SA_OK);
+    EXPECT_EQ(kviCsConfigUnregister(callback[0], &cont_), SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_TRUE(log.contains("Attempt to unregister FnPtr when 0 registered"));
+    EXPECT_EQ(kviCsConfigPerformCallbacks(&cont_), SA_OK); // nothing to copy, nothing to fail
+    for (int i = 0; i < 10; ++i)
+        ASSERT_EQ(kviCsConfigRegister(callback[i], &cont_), SA_OK);
     EXPECT_EQ(kviCsConfigRegister(callback[0], &cont_), SA_ERR_HPI_DUPLICATE);
     EXPECT_TRUE(log.contains("Callback already registered"));
-    for (int i = 1; i < 10; ++i)
-        ASSERT_EQ(kviCsConfigRegister(callback[i], &cont_), SA_OK);
     EXPECT_EQ(cont_.CallbackList->CountAllocated, 10u);
 
     // Growing can fail, and then nothing changes.
@@ -457,51 +362,24 @@ TEST_F(KviConfigCallbacks, RegistrationRefusesDuplicatesAndGrowsAtTheEleventh)
     EXPECT_EQ(kviCsConfigRegister(callback[10], &cont_), SA_ERR_HPI_OUT_OF_SPACE);
     EXPECT_TRUE(log.contains("Realloc failed"));
     EXPECT_EQ(cont_.CallbackCount, 10u);
-
     ASSERT_EQ(kviCsConfigRegister(callback[10], &cont_), SA_OK);
     EXPECT_EQ(cont_.CallbackList->CountAllocated, 21u);
-    EXPECT_EQ(cont_.CallbackCount, 11u);
 
-    calls.clear();
-    EXPECT_EQ(kviCsConfigPerformCallbacks(&cont_), SA_OK);
-    EXPECT_EQ(calls, (std::vector<int>{0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10}));
-    for (int i = 0; i < 11; ++i)
-        EXPECT_EQ(kviCsConfigUnregister(callback[i], &cont_), SA_OK);
-}
-
-TEST_F(KviConfigCallbacks, UnregisteringMovesTheLastIntoTheGap)
-{
-    load("a = \"1\"\n");
-    KviLogCapture log;
-    EXPECT_EQ(kviCsConfigUnregister(callback[0], &cont_), SA_ERR_HPI_NOT_PRESENT);
-    EXPECT_TRUE(log.contains("Attempt to unregister FnPtr when 0 registered"));
-    for (int i = 0; i < 3; ++i)
-        ASSERT_EQ(kviCsConfigRegister(callback[i], &cont_), SA_OK);
-    ASSERT_EQ(kviCsConfigUnregister(callback[0], &cont_), SA_OK);
-    calls.clear();
-    EXPECT_EQ(kviCsConfigPerformCallbacks(&cont_), SA_OK);
-    EXPECT_EQ(calls, (std::vector<int>{2, 1}));
-
-    EXPECT_EQ(kviCsConfigUnregister(callback[0], &cont_), SA_ERR_HPI_NOT_PRESENT);
-    EXPECT_TRUE(log.contains("FnPtr not present in the list"));
-    EXPECT_EQ(kviCsConfigUnregister(nullptr, &cont_), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsConfigUnregister(callback[1], &cont_), SA_OK);
-    EXPECT_EQ(kviCsConfigUnregister(callback[2], &cont_), SA_OK);
-    EXPECT_EQ(cont_.CallbackCount, 0u);
-}
-
-TEST_F(KviConfigCallbacks, RunningCallbacksCanRunOutOfMemory)
-{
-    load("a = \"1\"\n");
-    KviLogCapture log;
-    EXPECT_EQ(kviCsConfigPerformCallbacks(&cont_), SA_OK); // nothing to copy, nothing to fail
-    ASSERT_EQ(kviCsConfigRegister(callback[0], &cont_), SA_OK);
+    // So can copying the list to run it; then no callback runs.
     calls.clear();
     kviCsMemoryFailNthAllocation(1);
     EXPECT_EQ(kviCsConfigPerformCallbacks(&cont_), SA_ERR_HPI_OUT_OF_SPACE);
     EXPECT_TRUE(log.contains("Malloc failed"));
     EXPECT_TRUE(calls.empty());
-    EXPECT_EQ(kviCsConfigUnregister(callback[0], &cont_), SA_OK);
+
+    // The last entry moves into the gap: order is not kept.
+    ASSERT_EQ(kviCsConfigUnregister(callback[0], &cont_), SA_OK);
+    EXPECT_EQ(kviCsConfigUnregister(callback[0], &cont_), SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_TRUE(log.contains("FnPtr not present in the list"));
+    EXPECT_EQ(kviCsConfigPerformCallbacks(&cont_), SA_OK);
+    EXPECT_EQ(calls, (std::vector<int>{10, 1, 2, 3, 4, 5, 6, 7, 8, 9}));
+    for (int i = 1; i < 11; ++i)
+        EXPECT_EQ(kviCsConfigUnregister(callback[i], &cont_), SA_OK);
 }
 
 KviCsCfgContainer *reading = nullptr;
@@ -522,7 +400,7 @@ TEST_F(KviConfigCallbacks, ReloadSwapsTheListAndCallbacksMayReadAndRegister)
     SaHpiInt64T firstLoad = cont_.UpdateTime;
     ASSERT_EQ(kviCsConfigRegister(readingCallback, &cont_), SA_OK);
     dir_.write("kvi.conf", "a = \"new\"\nb = \"2\"\n");
-    shiftModificationTime(path_, -100);
+    backdate(path_);
 
     SaHpiInt32T blocks = kviTestLiveBlocks();
     calls.clear();
@@ -537,7 +415,6 @@ TEST_F(KviConfigCallbacks, ReloadSwapsTheListAndCallbacksMayReadAndRegister)
 
     ASSERT_EQ(kviCsConfigProcessChanges(&cont_), SA_OK);
     EXPECT_EQ(calls, (std::vector<int>{5}));
-    EXPECT_EQ(kviCsConfigRegister(callback[5], &cont_), SA_ERR_HPI_DUPLICATE);
     EXPECT_EQ(kviCsConfigUnregister(readingCallback, &cont_), SA_OK);
     EXPECT_EQ(kviCsConfigUnregister(callback[5], &cont_), SA_OK);
 }
@@ -578,41 +455,17 @@ TEST_F(KviConfigCallbacks, WatcherReloadsATouchedFileAndKeepsReloadingEverySecon
     EXPECT_EQ(watcherCalls.load(), 0);
 
     dir_.write("kvi.conf", "a = \"2\"\n");
-    shiftModificationTime(path_, -100);
+    backdate(path_);
     ASSERT_TRUE(waitFor([] { return watcherCalls.load() >= 1; }, 3000ms));
     EXPECT_EQ(get("a"), "2");
     // The container keeps its first load's time, so every poll differs now.
     auto start = Clock::now();
     ASSERT_TRUE(waitFor([] { return watcherCalls.load() >= 3; }, 4000ms));
-    EXPECT_GT(msSince(start), 900);
+    EXPECT_GT(Clock::now() - start, 900ms);
     EXPECT_EQ(kviCsConfigUnregister(countingCallback, &cont_), SA_OK);
 }
 
-TEST_F(KviConfigCallbacks, FinalizationStopsTheWatcherPromptly)
-{
-    load("a = \"1\"\n", SAHPI_TRUE);
-    std::this_thread::sleep_for(250ms);
-    auto start = Clock::now();
-    EXPECT_EQ(kviCsConfigFinalizeStrucure(&cont_), SA_OK);
-    EXPECT_LT(msSince(start), 400);
-    EXPECT_FALSE(cont_.HasThread);
-    loaded_ = false;
-}
-
-TEST_F(KviConfigCallbacks, AWatcherCanBeAddedOnceAndEndsWhenItsFileGoes)
-{
-    load("a = \"1\"\n");
-    KviLogCapture log;
-    ASSERT_EQ(kviCsConfigAddWaitingThread(&cont_), SA_OK);
-    EXPECT_EQ(kviCsConfigAddWaitingThread(&cont_), SA_ERR_HPI_DUPLICATE);
-    EXPECT_TRUE(log.contains("kviCsConfigAddWaitingThread called on config container with thread"));
-    ASSERT_EQ(remove(path_.c_str()), 0);
-    EXPECT_TRUE(
-        waitFor([&] { return log.contains("Unable to load config file " + path_); }, 3000ms));
-    // The thread has ended; finalization joins it all the same.
-}
-
-TEST_F(KviConfigCallbacks, AddingAWatcherCanFail)
+TEST_F(KviConfigCallbacks, AWatcherIsAddedOnceAndFinalizationStopsItPromptly)
 {
     load("a = \"1\"\n");
     KviLogCapture log;
@@ -623,8 +476,23 @@ TEST_F(KviConfigCallbacks, AddingAWatcherCanFail)
     EXPECT_FALSE(cont_.HasThread);
     EXPECT_EQ(kviTestLiveBlocks(), blocks);
 
-    EXPECT_EQ(kviCsThreadRoutine(nullptr), nullptr);
-    EXPECT_TRUE(log.contains("CfgContainer is NULL"));
+    ASSERT_EQ(kviCsConfigAddWaitingThread(&cont_), SA_OK);
+    EXPECT_EQ(kviCsConfigAddWaitingThread(&cont_), SA_ERR_HPI_DUPLICATE);
+    EXPECT_TRUE(log.contains("kviCsConfigAddWaitingThread called on config container with thread"));
+    std::this_thread::sleep_for(250ms);
+    auto start = Clock::now();
+    EXPECT_EQ(kviCsConfigFinalizeStrucure(&cont_), SA_OK);
+    EXPECT_LT(Clock::now() - start, 400ms);
+}
+
+TEST_F(KviConfigCallbacks, AWatcherEndsWhenItsFileGoes)
+{
+    load("a = \"1\"\n", SAHPI_TRUE);
+    KviLogCapture log;
+    ASSERT_EQ(remove(path_.c_str()), 0);
+    EXPECT_TRUE(
+        waitFor([&] { return log.contains("Unable to load config file " + path_); }, 3000ms));
+    // The thread has ended; finalization joins it all the same.
 }
 
 void wedgeDeleteSem()

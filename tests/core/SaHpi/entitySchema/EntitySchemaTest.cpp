@@ -1,7 +1,7 @@
 #include "core/SaHpi/entitySchema/EntitySchema.h"
 
-#include <cstdio>
 #include <string>
+#include <tuple>
 
 #include <gtest/gtest.h>
 
@@ -13,33 +13,26 @@ namespace
 class EntitySchemaTest : public testing::Test
 {
   protected:
-    void SetUp() override
-    {
-        kviCsEntitySchemaForget();
-        log.clear();
-    }
+    void SetUp() override { kviCsEntitySchemaForget(); }
     void TearDown() override
     {
-        unload();
+        configure(nullptr);
         kviCsEntitySchemaForget();
     }
-
-    // Makes `contents` the process's configuration.
-    void load(const std::string &contents)
-    {
-        unload();
-        ASSERT_EQ(kviCsConfigInit(SAHPI_FALSE, dir_.write("kvi.conf", contents).c_str()), SA_OK);
-        loaded_ = true;
-    }
-    void unload()
+    // Makes `contents` the process's configuration; nullptr leaves none.
+    void configure(const char *contents)
     {
         if (loaded_)
             kviCsConfigFinalize();
-        loaded_ = false;
+        loaded_ = contents != nullptr;
+        if (loaded_) {
+            ASSERT_EQ(kviCsConfigInit(SAHPI_FALSE, dir_.write("kvi.conf", contents).c_str()),
+                      SA_OK);
+        }
     }
-    static std::string schemaLine(const std::string &value)
+    void configureSchema(const std::string &value)
     {
-        return "KviEntitySchemaId = \"" + value + "\"\n";
+        configure(("KviEntitySchemaId = \"" + value + "\"\n").c_str());
     }
 
     KviLogCapture log{KVI_LOG_DBG_L_NUM};
@@ -78,78 +71,41 @@ TEST_F(EntitySchemaTest, ValuesAndTheirIdentifiers)
     for (const Case &c : cases) {
         SCOPED_TRACE(std::string("value \"") + c.value + "\"");
         kviCsEntitySchemaForget();
-        load(schemaLine(c.value));
+        configureSchema(c.value);
         log.clear();
         SaHpiUint32T value = 0xDEADBEEF;
         EXPECT_EQ(kviCsEntitySchemaGet(&value), c.rc);
         EXPECT_EQ(value, c.identifier);
-        if (c.message != nullptr) {
-            EXPECT_TRUE(log.contains(c.message));
-        }
+        EXPECT_TRUE(c.message == nullptr || log.contains(c.message));
     }
 }
 
-TEST_F(EntitySchemaTest, FirstSuccessIsKeptForTheLifeOfTheProcess)
-{
-    load(schemaLine("ATCA"));
-    SaHpiUint32T value = 0;
-    ASSERT_EQ(kviCsEntitySchemaGet(&value), SA_OK);
-
-    load(schemaLine("CPCI"));
-    log.clear();
-    value = 0;
-    EXPECT_EQ(kviCsEntitySchemaGet(&value), SA_OK);
-    EXPECT_EQ(value, 0x41544341u);
-    EXPECT_TRUE(log.contains("Saved Value: 41544341"));
-
-    // Even a configuration without the key no longer matters.
-    load("other = \"1\"\n");
-    EXPECT_EQ(kviCsEntitySchemaGet(&value), SA_OK);
-    EXPECT_EQ(value, 0x41544341u);
-}
-
-TEST_F(EntitySchemaTest, FailuresAreNotCachedAndTheNextCallReadsAgain)
-{
-    load(schemaLine("ATCa"));
-    SaHpiUint32T value = 1;
-    EXPECT_EQ(kviCsEntitySchemaGet(&value), SA_ERR_HPI_ERROR);
-    EXPECT_EQ(kviCsEntitySchemaGet(&value), SA_ERR_HPI_ERROR);
-    EXPECT_EQ(log.matching("Invalid Entity Schema ATCa").size(), 2u);
-
-    load(schemaLine("OEMb"));
-    EXPECT_EQ(kviCsEntitySchemaGet(&value), SA_OK);
-    EXPECT_EQ(value, 0x4F454D62u);
-}
-
-TEST_F(EntitySchemaTest, MissingKeyFailsEveryCall)
-{
-    load("KviEntitySchemaIdent = \"CPCI\"\nkvientityschemaid = \"CPCI\"\n");
-    for (int call = 0; call < 3; call++) {
-        SaHpiUint32T value = 5;
-        EXPECT_EQ(kviCsEntitySchemaGet(&value), SA_ERR_HPI_ERROR);
-        EXPECT_EQ(value, 0u);
-    }
-    EXPECT_EQ(log.matching("Unable to retrieve Config Data rc, -1013").size(), 3u);
-}
-
-TEST_F(EntitySchemaTest, WithoutAConfigurationTheCallFails)
+TEST_F(EntitySchemaTest, FailuresAreReadAgainAndTheFirstSuccessIsKeptForGood)
 {
     SaHpiUint32T value = 5;
-    EXPECT_EQ(kviCsEntitySchemaGet(&value), SA_ERR_HPI_ERROR);
-    EXPECT_EQ(value, 0u);
-    EXPECT_TRUE(log.contains("Unable to retrieve Config Data rc, "));
-}
-
-TEST_F(EntitySchemaTest, NullValueIsRefusedAndNothingIsRead)
-{
-    load(schemaLine("CPCI"));
     EXPECT_EQ(kviCsEntitySchemaGet(nullptr), SA_ERR_HPI_INVALID_PARAMS);
     EXPECT_TRUE(log.contains("Value pointer is NULL."));
-    // The refused call cached nothing: a changed setting is still seen.
-    load(schemaLine("ATCA"));
-    SaHpiUint32T value = 0;
-    EXPECT_EQ(kviCsEntitySchemaGet(&value), SA_OK);
-    EXPECT_EQ(value, 0x41544341u);
+    // One configuration after another: none, a bad value, the key missing
+    // (names are exact), then good values, of which only the first counts.
+    const std::tuple<const char *, SaErrorT, SaHpiUint32T, const char *> steps[] = {
+        {nullptr, SA_ERR_HPI_ERROR, 0, "Unable to retrieve Config Data rc, "},
+        {"KviEntitySchemaId = \"ATCa\"\n", SA_ERR_HPI_ERROR, 0, "Invalid Entity Schema ATCa"},
+        {"KviEntitySchemaId = \"ATCa\"\n", SA_ERR_HPI_ERROR, 0, "Invalid Entity Schema ATCa"},
+        {"KviEntitySchemaIdent = \"CPCI\"\nkvientityschemaid = \"CPCI\"\n", SA_ERR_HPI_ERROR, 0,
+         "Unable to retrieve Config Data rc, -1013"},
+        {"KviEntitySchemaId = \"OEMb\"\n", SA_OK, 0x4F454D62, "Value: 4f454d62"},
+        {"KviEntitySchemaId = \"CPCI\"\n", SA_OK, 0x4F454D62, "Saved Value: 4f454d62"},
+        {"other = \"1\"\n", SA_OK, 0x4F454D62, "Saved Value: 4f454d62"},
+    };
+    for (const auto &[contents, rc, identifier, message] : steps) {
+        SCOPED_TRACE(contents != nullptr ? contents : "no configuration");
+        configure(contents);
+        log.clear();
+        value = 5;
+        EXPECT_EQ(kviCsEntitySchemaGet(&value), rc);
+        EXPECT_EQ(value, identifier);
+        EXPECT_TRUE(log.contains(message));
+    }
 }
 
 } // namespace
