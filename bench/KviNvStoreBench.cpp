@@ -76,14 +76,19 @@ class Store
     bool ok_ = false;
 };
 
-void BM_NvPutReplace(benchmark::State &state)
+// Replaces the first object once per iteration.
+void replaceFirstObject(benchmark::State &state, const Store &store)
 {
-    Store store(static_cast<int>(state.range(0)));
     if (!store.ok())
         state.SkipWithError("store did not start");
     for (auto _ : state)
         if (kviCsNonVolatilePut("kviBenchKey0", sizeof SMALL_VALUE, SMALL_VALUE) != SA_OK)
             state.SkipWithError("put failed");
+}
+
+void BM_NvPutReplace(benchmark::State &state)
+{
+    replaceFirstObject(state, Store(static_cast<int>(state.range(0))));
 }
 BENCHMARK(BM_NvPutReplace)->Arg(1)->Arg(1000)->Arg(10000)->Unit(benchmark::kMicrosecond);
 
@@ -92,9 +97,7 @@ void BM_NvPutReplaceWithoutDirectorySync(benchmark::State &state)
 {
     Store store(1);
     kviCsNvFileOps.syncFile = [](int) { return 0; };
-    for (auto _ : state)
-        if (kviCsNonVolatilePut("kviBenchKey0", sizeof SMALL_VALUE, SMALL_VALUE) != SA_OK)
-            state.SkipWithError("put failed");
+    replaceFirstObject(state, store);
     kviCsNvFileOps = kviCsNvDefaultFileOps;
 }
 BENCHMARK(BM_NvPutReplaceWithoutDirectorySync)->Unit(benchmark::kMicrosecond);

@@ -66,6 +66,30 @@ void requireListLocked()
     }
 }
 
+// A lock waited for in vain ends the operation with this line.
+bool lockHeld(const KviSemGuard &Guard)
+{
+    if (Guard.held())
+        return true;
+    KVI_ELOG(KVI_LOG_ERR_NONFATAL, "KVI_CS_SEM_WAIT failed. rc=%d", Guard.result());
+    return false;
+}
+
+SaErrorT initializedOrWhyNot()
+{
+    if (NvInitialized.load())
+        return SA_OK;
+    KVI_ELOG(KVI_LOG_ERR_NONFATAL, "NV storage is not initialized.");
+    return SA_ERR_HPI_UNINITIALIZED;
+}
+
+// The check of the operations that need both the list lock and a store that
+// is still initialized once they hold it (a finalize may have come first).
+SaErrorT listUsable(const KviSemGuard &List)
+{
+    return lockHeld(List) ? initializedOrWhyNot() : SA_ERR_HPI_ERROR;
+}
+
 // Only names of exactly ten digits are object files. A number that does not
 // fit the 32-bit object numbers (or is the invalid number) cannot be one of
 // ours and is left alone like any other foreign file.
@@ -138,13 +162,47 @@ bool keyEquals(const NvListItemT &Item, const char *Key, SaHpiUint8T KeyLen)
            memcmp(Item.KeyName, Key, KeyLen) == 0;
 }
 
-void unlinkObjectFile(const char *Path)
+// The index of the first entry that matches, for callers holding the list lock.
+template <typename MatchT> SaHpiUint32T findEntry(MatchT Matches)
 {
-    if (kviCsNvFileOps.unlinkFile(Path) != 0) {
-        int err = errno;
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Could not delete object file %s. err=%d(%s)", Path, err,
-                 strerror(err));
-    }
+    requireListLocked();
+    for (SaHpiUint32T i = 0; i < CurrentLastNvObject; ++i)
+        if (Matches(NvObjectList[i]))
+            return i;
+    return NV_INVALID_LIST_ENTRY;
+}
+
+// The lookups proper pass over the entry of a put in progress and name what
+// they found in their exit line; ExitText outlives the caller's trace.
+using ExitTextT = char[32];
+template <typename MatchT>
+SaHpiUint32T findValidEntry(KviFunctionTrace &Trace, ExitTextT &ExitText, MatchT Matches)
+{
+    snprintf(ExitText, sizeof ExitText, "Not Found");
+    Trace.exitMessage(ExitText);
+    SaHpiUint32T index =
+        findEntry([&](const NvListItemT &Item) { return Item.Valid && Matches(Item); });
+    if (index != NV_INVALID_LIST_ENTRY)
+        snprintf(ExitText, sizeof ExitText, "Found %u", index);
+    return index;
+}
+
+bool unlinkObjectFile(const char *Path)
+{
+    if (kviCsNvFileOps.unlinkFile(Path) == 0)
+        return true;
+    int err = errno;
+    KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Could not delete object file %s. err=%d(%s)", Path, err,
+             strerror(err));
+    return false;
+}
+
+// A file that no list entry names any more: a deleted object's, the one a
+// put replaced, or the new one of a put that failed after writing it.
+bool unlinkFormerFile(const char *Path)
+{
+    KVI_DLOG(KVI_LOG_DBG_H, "Attempting to delete  %s", Path);
+    return unlinkObjectFile(Path);
 }
 
 void deleteDamagedFile(const char *Path)
@@ -170,20 +228,15 @@ void forgetStore()
 // again by its number: being serialized, only one put has such an entry.
 SaHpiUint32T findPendingEntry(SaHpiUint32T FileNumber)
 {
-    requireListLocked();
-    for (SaHpiUint32T i = 0; i < CurrentLastNvObject; ++i)
-        if (!NvObjectList[i].Valid && NvObjectList[i].FileNumber == FileNumber)
-            return i;
-    return NV_INVALID_LIST_ENTRY;
+    return findEntry(
+        [&](const NvListItemT &Item) { return !Item.Valid && Item.FileNumber == FileNumber; });
 }
 
 void removePendingEntry(SaHpiUint32T FileNumber)
 {
     KVI_SEM_GUARD(list, &NvObjectListSem, NV_LIST_SEM_TIMEOUT);
-    if (!list.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "KVI_CS_SEM_WAIT failed. rc=%d", list.result());
+    if (!lockHeld(list))
         return;
-    }
     SaHpiUint32T index = findPendingEntry(FileNumber);
     if (index != NV_INVALID_LIST_ENTRY)
         deleteNvObjectFromList(index, SAHPI_FALSE);
@@ -275,14 +328,8 @@ SaErrorT writeObjectFile(char *Path, const char *Key, SaHpiUint8T KeyLen, SaHpiU
 SaErrorT reserveObjectNumber(const char *Key, SaHpiUint8T KeyLen, SaHpiUint32T *Number, char **Path)
 {
     KVI_SEM_GUARD(list, &NvObjectListSem, NV_LIST_SEM_TIMEOUT);
-    if (!list.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "KVI_CS_SEM_WAIT failed. rc=%d", list.result());
-        return SA_ERR_HPI_ERROR;
-    }
-    if (!NvInitialized.load()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "NV storage is not initialized.");
-        return SA_ERR_HPI_UNINITIALIZED;
-    }
+    if (SaErrorT usable = listUsable(list); usable != SA_OK)
+        return usable;
     SaHpiUint32T number = lowestFreeObjectNumber();
     KVI_DLOG(KVI_LOG_DBG_H, "ObjectNumber to use is %u", number);
     if (number == NV_INVALID_OBJECT_NUMBER) {
@@ -315,9 +362,7 @@ SaErrorT publishObject(const char *Key, SaHpiUint8T KeyLen, SaHpiUint32T Number,
                        bool *OldFileToDelete)
 {
     KVI_SEM_GUARD(list, &NvObjectListSem, NV_LIST_SEM_TIMEOUT);
-    if (!list.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "KVI_CS_SEM_WAIT failed. rc=%d", list.result());
-        list.release();
+    if (!lockHeld(list)) {
         removePendingEntry(Number);
         return SA_ERR_HPI_ERROR;
     }
@@ -354,10 +399,8 @@ SaErrorT registerScannedObject(const char *Path, const char *Name, const NvObjec
     SaHpiUint32T existingNumber = NV_INVALID_OBJECT_NUMBER;
     {
         KVI_SEM_GUARD(list, &NvObjectListSem, NV_LIST_SEM_TIMEOUT);
-        if (!list.held()) {
-            KVI_ELOG(KVI_LOG_ERR_NONFATAL, "KVI_CS_SEM_WAIT failed. rc=%d", list.result());
+        if (!lockHeld(list))
             return SA_ERR_HPI_ERROR;
-        }
         SaHpiUint32T index = findNvObjectInList(key, Object->Hdr.KeyLen);
         if (index == NV_INVALID_LIST_ENTRY) {
             SaErrorT rc = addNvObjectToList(key, Object->Hdr.KeyLen, Name, SAHPI_TRUE, &index);
@@ -495,11 +538,7 @@ SaErrorT checkKeyAndState(const char *Key, SaHpiUint8T *KeyLen)
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "nvKeyIsValid returned false for key %s", Key);
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    if (!NvInitialized.load()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "NV storage is not initialized.");
-        return SA_ERR_HPI_UNINITIALIZED;
-    }
-    return SA_OK;
+    return initializedOrWhyNot();
 }
 
 // Looks the key up for a get and names its file; a get reads the file
@@ -508,14 +547,8 @@ SaErrorT locateObject(const char *Key, SaHpiUint8T KeyLen, SaHpiUint32T *Index,
                       SaHpiUint32T *Number, char **Path)
 {
     KVI_SEM_GUARD(list, &NvObjectListSem, NV_LIST_SEM_TIMEOUT);
-    if (!list.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "KVI_CS_SEM_WAIT failed. rc=%d", list.result());
-        return SA_ERR_HPI_ERROR;
-    }
-    if (!NvInitialized.load()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "NV storage is not initialized.");
-        return SA_ERR_HPI_UNINITIALIZED;
-    }
+    if (SaErrorT usable = listUsable(list); usable != SA_OK)
+        return usable;
     *Index = findNvObjectInList(Key, KeyLen);
     if (*Index == NV_INVALID_LIST_ENTRY) {
         KVI_DLOG(KVI_LOG_DBG_H, "Key %s does not exist.", Key);
@@ -531,10 +564,8 @@ SaErrorT locateObject(const char *Key, SaHpiUint8T KeyLen, SaHpiUint32T *Index,
 void dropInvalidEntry(const char *Key, SaHpiUint8T KeyLen, SaHpiUint32T Index, SaHpiUint32T Number)
 {
     KVI_SEM_GUARD(list, &NvObjectListSem, NV_LIST_SEM_TIMEOUT);
-    if (!list.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "KVI_CS_SEM_WAIT failed. rc=%d", list.result());
+    if (!lockHeld(list))
         return;
-    }
     if (Index < CurrentLastNvObject && NvObjectList[Index].Valid &&
         NvObjectList[Index].FileNumber == Number && keyEquals(NvObjectList[Index], Key, KeyLen))
         deleteNvObjectFromList(Index, SAHPI_FALSE);
@@ -621,6 +652,46 @@ bool objectContentIsSound(const char *FilePath, const NvObjectT *Object)
     }
     return true;
 }
+
+// What reading an opened object file found: only damaged files are deleted,
+// a file that could not be read (or not without memory) may be sound.
+enum class FileVerdictT { Sound, Unreadable, Damaged };
+
+FileVerdictT readObjectFile(const char *FilePath, int Fd, off_t FileSize, NvObjectT **Object)
+{
+    SaHpiUint32T size = 0;
+    errno = 0;
+    ssize_t bytesRead = kviCsNvFileOps.readFile(Fd, &size, sizeof size);
+    if (bytesRead != static_cast<ssize_t>(sizeof size)) {
+        int err = errno;
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL,
+                 "read failed to get size of object from file %s. br=%d, errno=%d(%s)", FilePath,
+                 static_cast<int>(bytesRead), err, strerror(err));
+        return FileVerdictT::Unreadable;
+    }
+    if (static_cast<off_t>(size) != FileSize) {
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL,
+                 "Object from file %s claims to be a different size than it actually is. fs=%d, "
+                 "os=%d",
+                 FilePath, static_cast<int>(FileSize), static_cast<int>(size));
+        return FileVerdictT::Damaged;
+    }
+    // A size that agrees with the file but leaves no room for the header is
+    // no object either; reading on would run past the buffer.
+    if (size < NV_HEADER_SIZE) {
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL,
+                 "Object from file %s is too small to hold an object header. os=%u", FilePath,
+                 size);
+        return FileVerdictT::Damaged;
+    }
+    if (!readWholeObject(FilePath, Fd, size, Object))
+        return FileVerdictT::Unreadable;
+    if (objectContentIsSound(FilePath, *Object))
+        return FileVerdictT::Sound;
+    KVI_CS_FREE(*Object);
+    *Object = nullptr;
+    return FileVerdictT::Damaged;
+}
 } // namespace
 
 KviNvFileOpsT kviCsNvFileOps = {defaultOpen, read, write, fsync, close, unlink};
@@ -641,34 +712,19 @@ KviCsSemaphore *kviCsNvDeleteSemaphore() noexcept
 
 SaHpiUint32T findNvObjectInList(const char *Key, SaHpiUint8T KeyLen) noexcept
 {
-    char exitText[32] = "Not Found";
+    ExitTextT exitText;
     KVI_TRACE("KeyLen=%u", static_cast<SaHpiUint32T>(KeyLen));
-    trace.exitMessage(exitText);
-    requireListLocked();
-    if (Key == nullptr)
-        return NV_INVALID_LIST_ENTRY;
-    for (SaHpiUint32T i = 0; i < CurrentLastNvObject; ++i) {
-        if (NvObjectList[i].Valid && keyEquals(NvObjectList[i], Key, KeyLen)) {
-            snprintf(exitText, sizeof exitText, "Found %u", i);
-            return i;
-        }
-    }
-    return NV_INVALID_LIST_ENTRY;
+    return findValidEntry(trace, exitText, [&](const NvListItemT &Item) {
+        return Key != nullptr && keyEquals(Item, Key, KeyLen);
+    });
 }
 
 SaHpiUint32T findNvObjectInListByFileNumber(SaHpiUint32T FileNumber) noexcept
 {
-    char exitText[32] = "Not Found";
+    ExitTextT exitText;
     KVI_TRACE("FileNumber=%u", FileNumber);
-    trace.exitMessage(exitText);
-    requireListLocked();
-    for (SaHpiUint32T i = 0; i < CurrentLastNvObject; ++i) {
-        if (NvObjectList[i].Valid && NvObjectList[i].FileNumber == FileNumber) {
-            snprintf(exitText, sizeof exitText, "Found %u", i);
-            return i;
-        }
-    }
-    return NV_INVALID_LIST_ENTRY;
+    return findValidEntry(trace, exitText,
+                          [&](const NvListItemT &Item) { return Item.FileNumber == FileNumber; });
 }
 
 // The numbers are looked at a window at a time with a small bitmap, so a
@@ -733,10 +789,8 @@ SaErrorT deleteNvObjectFromList(SaHpiUint32T ObjectIndex, SaHpiBoolT NeedLock) n
     std::optional<KviSemGuard> list;
     if (NeedLock) {
         list.emplace(&NvObjectListSem, NV_LIST_SEM_TIMEOUT, KVI_CALL_SITE("&NvObjectListSem"));
-        if (!list->held()) {
-            KVI_ELOG(KVI_LOG_ERR_NONFATAL, "KVI_CS_SEM_WAIT failed. rc=%d", list->result());
+        if (!lockHeld(*list))
             return SA_ERR_HPI_ERROR;
-        }
     } else {
         requireListLocked();
     }
@@ -808,46 +862,13 @@ SaHpiBoolT nvObjectIsValid(const char *FilePath, NvObjectT **NvObject) noexcept
                      strerror(err));
         return SAHPI_FALSE;
     }
-    SaHpiUint32T size = 0;
-    errno = 0;
-    ssize_t bytesRead = kviCsNvFileOps.readFile(fd, &size, sizeof size);
-    if (bytesRead != static_cast<ssize_t>(sizeof size)) {
-        int err = errno;
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL,
-                 "read failed to get size of object from file %s. br=%d, errno=%d(%s)", FilePath,
-                 static_cast<int>(bytesRead), err, strerror(err));
-        kviCsNvFileOps.closeFile(fd);
-        return SAHPI_FALSE;
-    }
-    if (static_cast<off_t>(size) != status.st_size) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL,
-                 "Object from file %s claims to be a different size than it actually is. fs=%d, "
-                 "os=%d",
-                 FilePath, static_cast<int>(status.st_size), static_cast<int>(size));
-        kviCsNvFileOps.closeFile(fd);
-        deleteDamagedFile(FilePath);
-        return SAHPI_FALSE;
-    }
-    // A size that agrees with the file but leaves no room for the header is
-    // no object either; reading on would run past the buffer.
-    if (size < NV_HEADER_SIZE) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL,
-                 "Object from file %s is too small to hold an object header. os=%u", FilePath,
-                 size);
-        kviCsNvFileOps.closeFile(fd);
-        deleteDamagedFile(FilePath);
-        return SAHPI_FALSE;
-    }
     NvObjectT *object = nullptr;
-    bool complete = readWholeObject(FilePath, fd, size, &object);
+    FileVerdictT verdict = readObjectFile(FilePath, fd, status.st_size, &object);
     kviCsNvFileOps.closeFile(fd);
-    if (!complete)
-        return SAHPI_FALSE;
-    if (!objectContentIsSound(FilePath, object)) {
-        KVI_CS_FREE(object);
+    if (verdict == FileVerdictT::Damaged)
         deleteDamagedFile(FilePath);
+    if (verdict != FileVerdictT::Sound)
         return SAHPI_FALSE;
-    }
     *NvObject = object;
     return SAHPI_TRUE;
 }
@@ -883,16 +904,12 @@ KVI_EXPORT SaErrorT kviCsNonVolatileInitialize(void) noexcept
 KVI_EXPORT SaErrorT kviCsNonVolatileFinalize(void) noexcept
 {
     KVI_TRACE("");
-    if (!NvInitialized.load()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "NV storage is not initialized.");
-        return SA_ERR_HPI_UNINITIALIZED;
-    }
+    if (SaErrorT rc = initializedOrWhyNot(); rc != SA_OK)
+        return rc;
     NvInitialized.store(SAHPI_FALSE);
     KVI_SEM_GUARD(list, &NvObjectListSem, NV_LIST_SEM_TIMEOUT);
-    if (!list.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "KVI_CS_SEM_WAIT failed. rc=%d", list.result());
+    if (!lockHeld(list))
         return SA_ERR_HPI_ERROR;
-    }
     forgetStore();
     return SA_OK;
 }
@@ -913,10 +930,8 @@ KVI_EXPORT SaErrorT kviCsNonVolatilePut(const char *Key, SaHpiUint32T BytesToWri
         return rc;
 
     KVI_SEM_GUARD(files, &NvObjectDeleteSem, NV_DELETE_SEM_TIMEOUT);
-    if (!files.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "KVI_CS_SEM_WAIT failed. rc=%d", files.result());
+    if (!lockHeld(files))
         return SA_ERR_HPI_ERROR;
-    }
     SaHpiUint32T number = NV_INVALID_OBJECT_NUMBER;
     char *path = nullptr;
     rc = reserveObjectNumber(Key, keyLen, &number, &path);
@@ -930,15 +945,11 @@ KVI_EXPORT SaErrorT kviCsNonVolatilePut(const char *Key, SaHpiUint32T BytesToWri
     }
     bool oldFileToDelete = false;
     rc = publishObject(Key, keyLen, number, path, &oldFileToDelete);
-    if (rc != SA_OK) {
-        // The new file is complete but the put failed: left behind, it could
-        // win over the old object at the next start.
-        KVI_DLOG(KVI_LOG_DBG_H, "Attempting to delete  %s", path);
-        unlinkObjectFile(path);
-    } else if (oldFileToDelete) {
-        KVI_DLOG(KVI_LOG_DBG_H, "Attempting to delete  %s", path);
-        unlinkObjectFile(path);
-    }
+    // After a failure the new file goes: it is complete, and left behind it
+    // could win over the old object at the next start. After a success path
+    // names the replaced object's file.
+    if (rc != SA_OK || oldFileToDelete)
+        unlinkFormerFile(path);
     KVI_CS_FREE(path);
     return rc;
 }
@@ -998,21 +1009,13 @@ KVI_EXPORT SaErrorT kviCsNonVolatileDelete(const char *Key) noexcept
         return rc;
 
     KVI_SEM_GUARD(files, &NvObjectDeleteSem, NV_DELETE_SEM_TIMEOUT);
-    if (!files.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "KVI_CS_SEM_WAIT failed. rc=%d", files.result());
+    if (!lockHeld(files))
         return SA_ERR_HPI_ERROR;
-    }
     char *path = nullptr;
     {
         KVI_SEM_GUARD(list, &NvObjectListSem, NV_LIST_SEM_TIMEOUT);
-        if (!list.held()) {
-            KVI_ELOG(KVI_LOG_ERR_NONFATAL, "KVI_CS_SEM_WAIT failed. rc=%d", list.result());
-            return SA_ERR_HPI_ERROR;
-        }
-        if (!NvInitialized.load()) {
-            KVI_ELOG(KVI_LOG_ERR_NONFATAL, "NV storage is not initialized.");
-            return SA_ERR_HPI_UNINITIALIZED;
-        }
+        if (SaErrorT usable = listUsable(list); usable != SA_OK)
+            return usable;
         SaHpiUint32T index = findNvObjectInList(Key, keyLen);
         if (index == NV_INVALID_LIST_ENTRY) {
             KVI_DLOG(KVI_LOG_DBG_H, "Key %s does not exist.", Key);
@@ -1023,13 +1026,7 @@ KVI_EXPORT SaErrorT kviCsNonVolatileDelete(const char *Key) noexcept
             return SA_ERR_HPI_ERROR;
         deleteNvObjectFromList(index, SAHPI_FALSE);
     }
-    KVI_DLOG(KVI_LOG_DBG_H, "Attempting to delete  %s", path);
-    if (kviCsNvFileOps.unlinkFile(path) != 0) {
-        int err = errno;
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Could not delete object file %s. err=%d(%s)", path, err,
-                 strerror(err));
-        rc = SA_ERR_HPI_ERROR;
-    }
+    rc = unlinkFormerFile(path) ? SA_OK : SA_ERR_HPI_ERROR;
     KVI_CS_FREE(path);
     return rc;
 }
@@ -1047,14 +1044,8 @@ KVI_EXPORT SaErrorT kviCsNonVolatileFind(const char *SearchKey, SaHpiUint32T Buf
         return rc;
 
     KVI_SEM_GUARD(list, &NvObjectListSem, NV_LIST_SEM_TIMEOUT);
-    if (!list.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "KVI_CS_SEM_WAIT failed. rc=%d", list.result());
-        return SA_ERR_HPI_ERROR;
-    }
-    if (!NvInitialized.load()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "NV storage is not initialized.");
-        return SA_ERR_HPI_UNINITIALIZED;
-    }
+    if (SaErrorT usable = listUsable(list); usable != SA_OK)
+        return usable;
     auto *slots = static_cast<char *>(Buffer);
     SaHpiUint32T count = 0;
     for (SaHpiUint32T i = 0; i < CurrentLastNvObject; ++i) {
