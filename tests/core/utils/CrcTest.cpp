@@ -26,19 +26,16 @@ SaHpiUint32T bitwiseCrc(const std::vector<SaHpiUint8T> &data)
     return ~reg;
 }
 
-TEST(Crc, CheckValueOfTheStandardString)
+TEST(Crc, KnownValuesAndSizesOfZeroOrLess)
 {
-    const char *check = "123456789";
-    EXPECT_EQ(kviCsCrcGen(check, 9), 0xFC891918u);
-}
-
-TEST(Crc, KnownValuesOfShortInputs)
-{
-    // One zero byte and one 0xFF byte under CRC-32/BZIP2.
+    // The check value of CRC-32/BZIP2, and one zero byte and one 0xFF byte.
+    EXPECT_EQ(kviCsCrcGen("123456789", 9), 0xFC891918u);
     const SaHpiUint8T zero = 0x00;
     const SaHpiUint8T ones = 0xFF;
     EXPECT_EQ(kviCsCrcGen(&zero, 1), 0xB1F7404Bu);
     EXPECT_EQ(kviCsCrcGen(&ones, 1), 0x000000FFu);
+    for (SaHpiInt32T size : {0, -1, INT32_MIN})
+        EXPECT_EQ(kviCsCrcGen("abc", size), 0u) << size;
 }
 
 TEST(Crc, AgreesWithTheBitwiseDefinitionOnRandomData)
@@ -51,25 +48,6 @@ TEST(Crc, AgreesWithTheBitwiseDefinitionOnRandomData)
             b = static_cast<SaHpiUint8T>(random());
         EXPECT_EQ(kviCsCrcGen(data.data(), length), bitwiseCrc(data));
     }
-}
-
-TEST(Crc, EveryFlippedBitChangesTheValue)
-{
-    std::vector<SaHpiUint8T> data(64, 0x5A);
-    SaHpiUint32T original = kviCsCrcGen(data.data(), 64);
-    for (size_t bit = 0; bit < data.size() * 8; ++bit) {
-        data[bit / 8] ^= static_cast<SaHpiUint8T>(1u << (bit % 8));
-        EXPECT_NE(kviCsCrcGen(data.data(), 64), original) << "bit " << bit;
-        data[bit / 8] ^= static_cast<SaHpiUint8T>(1u << (bit % 8));
-    }
-}
-
-TEST(Crc, SizeOfZeroOrLessGivesZero)
-{
-    const char *data = "abc";
-    EXPECT_EQ(kviCsCrcGen(data, 0), 0u);
-    EXPECT_EQ(kviCsCrcGen(data, -1), 0u);
-    EXPECT_EQ(kviCsCrcGen(data, INT32_MIN), 0u);
 }
 
 TEST(CrcDeathTest, NullDataEndsTheProcess)
