@@ -1,29 +1,19 @@
 #include <map>
 #include <string>
-#include <vector>
-
-#include <gtest/gtest.h>
 
 #include "core/SaHpi/rpt/RptTestSupport.h"
-#include "support/KviTestSupport.h"
 
 namespace
 {
-using Ids = std::vector<SaHpiEntryIdT>;
-
 // Runs first: nothing works before the store is set up, and it is set up once.
 TEST(RdrInitTest, RefusesEverythingUntilInitializedOnce)
 {
     KviLogCapture log(KVI_LOG_DBG_L_NUM);
     SaHpiRdrT rdr = makeRdr(SAHPI_SENSOR_RDR);
-    KviDsRdrFnTable table{};
-    SaHpiEntryIdT recordId = 0;
-    KviCsRdrRecordNumT number{};
     SaHpiBoolT active = SAHPI_FALSE;
     SaHpiEirIdT eir = 0;
     SaHpiUint32T size = 0;
-    EXPECT_EQ(kviCsRdrAdd(0, 1, &rdr, nullptr, &table, &recordId, &number),
-              SA_ERR_HPI_INVALID_REQUEST);
+    addRdr(1, SAHPI_SENSOR_RDR, {}, nullptr, SA_ERR_HPI_INVALID_REQUEST);
     EXPECT_EQ(kviCsRdrGet(0, 1, SAHPI_NO_RECORD, SAHPI_FIRST_ENTRY, nullptr, &rdr, &active, nullptr,
                           nullptr, nullptr, nullptr),
               SA_ERR_HPI_INVALID_REQUEST);
@@ -61,37 +51,38 @@ class RdrTest : public ResourceModelTest
     }
     SaHpiResourceIdT rid_ = 0;
 
-    SaHpiUint32T nextRecordId(SaHpiResourceIdT Rid)
+    SaHpiUint32T nextRecordId()
     {
         SaHpiUint32T next = 0;
-        withRepository(Rid, [&](KviCsRdrRepositoryContainerT *repo) { next = repo->NextRecordId; });
+        withRepository(rid_,
+                       [&](KviCsRdrRepositoryContainerT *repo) { next = repo->NextRecordId; });
         return next;
+    }
+
+    SaErrorT get(SaHpiRdrTypeT Type, SaHpiEntryIdT EntryId, SaHpiRdrT *Rdr = nullptr,
+                 SaHpiEntryIdT *Next = nullptr, SaHpiBoolT *Active = nullptr)
+    {
+        SaHpiBoolT active = SAHPI_FALSE;
+        return kviCsRdrGet(0, rid_, Type, EntryId, Next, Rdr, Active != nullptr ? Active : &active,
+                           nullptr, nullptr, nullptr, nullptr);
     }
 
     // The record ids a client walking the resource's records sees.
     Ids walk()
     {
         Ids ids;
-        SaHpiEntryIdT next = SAHPI_FIRST_ENTRY;
-        while (next != SAHPI_LAST_ENTRY) {
+        for (SaHpiEntryIdT next = SAHPI_FIRST_ENTRY; next != SAHPI_LAST_ENTRY;) {
             SaHpiRdrT rdr{};
-            SaHpiBoolT active = SAHPI_FALSE;
-            if (kviCsRdrGet(0, rid_, SAHPI_NO_RECORD, next, &next, &rdr, &active, nullptr, nullptr,
-                            nullptr, nullptr) != SA_OK)
+            if (get(SAHPI_NO_RECORD, next, &rdr, &next) != SA_OK)
                 break;
             ids.push_back(rdr.RecordId);
         }
         return ids;
     }
-
-    SaErrorT get(SaHpiRdrTypeT Type, SaHpiEntryIdT EntryId, SaHpiRdrT *Rdr = nullptr)
-    {
-        SaHpiBoolT active = SAHPI_FALSE;
-        return kviCsRdrGet(0, rid_, Type, EntryId, nullptr, Rdr, &active, nullptr, nullptr, nullptr,
-                           nullptr);
-    }
 };
 
+// The number field of every kind sits first in the record's union, and the
+// kinds share the number union, so one field each shows them all.
 TEST_F(RdrTest, NumberIsTheLowByteOfTheRecordIdWhateverThePluginSet)
 {
     for (SaHpiRdrTypeT type :
@@ -99,45 +90,24 @@ TEST_F(RdrTest, NumberIsTheLowByteOfTheRecordIdWhateverThePluginSet)
         SCOPED_TRACE(type);
         SaHpiRdrT rdr = makeRdr(type);
         rdr.RecordId = 77;
-        rdr.RdrTypeUnion.CtrlRec.Num = 77; // the number field of every kind sits first
-        KviDsRdrFnTable table{};
-        SaHpiEntryIdT recordId = 0;
+        rdr.RdrTypeUnion.CtrlRec.Num = 77;
         KviCsRdrRecordNumT number{};
         number.SensorNum = 77;
-        ASSERT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, &recordId, &number), SA_OK);
-        SaHpiUint8T expected = static_cast<SaHpiUint8T>(type);
+        SaHpiEntryIdT recordId = addRdr(rid_, type, {}, nullptr, SA_OK, &rdr, &number);
         EXPECT_EQ(recordId, SaHpiEntryIdT(type));
         EXPECT_EQ(rdr.RecordId, recordId);
-        switch (type) {
-        case SAHPI_CTRL_RDR:
-            EXPECT_EQ(rdr.RdrTypeUnion.CtrlRec.Num, expected);
-            EXPECT_EQ(number.ControlNum, expected);
-            break;
-        case SAHPI_SENSOR_RDR:
-            EXPECT_EQ(rdr.RdrTypeUnion.SensorRec.Num, expected);
-            EXPECT_EQ(number.SensorNum, expected);
-            break;
-        case SAHPI_INVENTORY_RDR:
-            EXPECT_EQ(rdr.RdrTypeUnion.InventoryRec.EirId, expected);
-            EXPECT_EQ(number.EirNum, expected);
-            break;
-        default:
-            EXPECT_EQ(rdr.RdrTypeUnion.WatchdogRec.WatchdogNum, expected);
-            EXPECT_EQ(number.WatchdogNum, expected);
-        }
+        EXPECT_EQ(rdr.RdrTypeUnion.CtrlRec.Num, SaHpiUint8T(type));
+        EXPECT_EQ(number.ControlNum, SaHpiUint8T(type));
         SaHpiRdrT stored{};
         ASSERT_EQ(get(type, recordId, &stored), SA_OK);
         EXPECT_EQ(stored.RecordId, recordId);
-        EXPECT_EQ(stored.RdrTypeUnion.CtrlRec.Num, expected);
+        EXPECT_EQ(stored.RdrTypeUnion.CtrlRec.Num, SaHpiUint8T(type));
     }
     for (SaHpiEntryIdT id = 5; id < 256; id++)
         addRdr(rid_, SAHPI_SENSOR_RDR);
     SaHpiRdrT rdr = makeRdr(SAHPI_SENSOR_RDR);
-    KviDsRdrFnTable table{};
-    SaHpiEntryIdT recordId = 0;
     KviCsRdrRecordNumT number{};
-    ASSERT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, &recordId, &number), SA_OK);
-    EXPECT_EQ(recordId, 256u);
+    EXPECT_EQ(addRdr(rid_, SAHPI_SENSOR_RDR, {}, nullptr, SA_OK, &rdr, &number), 256u);
     EXPECT_EQ(number.SensorNum, 0);
     EXPECT_EQ(rdr.RdrTypeUnion.SensorRec.Num, 0);
 }
@@ -151,49 +121,33 @@ TEST_F(RdrTest, WalkGoesByListThenAgeAndIgnoresTypes)
     // A typed read names the next record of any type.
     SaHpiEntryIdT next = 0;
     SaHpiBoolT active = SAHPI_TRUE;
-    ASSERT_EQ(kviCsRdrGet(0, rid_, SAHPI_SENSOR_RDR, 2, &next, nullptr, &active, nullptr, nullptr,
-                          nullptr, nullptr),
-              SA_OK);
+    ASSERT_EQ(get(SAHPI_SENSOR_RDR, 2, nullptr, &next, &active), SA_OK);
     EXPECT_EQ(next, 5u);
-    EXPECT_FALSE(active);
-    ASSERT_EQ(kviCsRdrGet(0, rid_, SAHPI_SENSOR_RDR, 5, &next, nullptr, &active, nullptr, nullptr,
-                          nullptr, nullptr),
-              SA_OK);
-    EXPECT_EQ(next, SAHPI_LAST_ENTRY);
-}
-
-TEST_F(RdrTest, ActiveResourcesTakeNoRecordsAndSpendNoId)
-{
-    addRdr(rid_, SAHPI_SENSOR_RDR);
+    EXPECT_FALSE(active) << "records carry their resource's state";
     ASSERT_EQ(kviCsRptEntryActiveStateSetByRid(0, rid_, SAHPI_TRUE), SA_OK);
-    SaHpiRdrT rdr = makeRdr(SAHPI_SENSOR_RDR);
-    KviDsRdrFnTable table{};
-    SaHpiEntryIdT recordId = 0;
-    KviCsRdrRecordNumT number{};
-    KviLogCapture log(KVI_LOG_DBG_L_NUM);
-    EXPECT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, &recordId, &number),
-              SA_ERR_HPI_INVALID_REQUEST);
-    EXPECT_TRUE(log.contains("Can't add entries to active resources"));
-    EXPECT_EQ(nextRecordId(rid_), 2u);
-    EXPECT_EQ(walk(), (Ids{1}));
+    ASSERT_EQ(get(SAHPI_SENSOR_RDR, 5, nullptr, &next, &active), SA_OK);
+    EXPECT_EQ(next, SAHPI_LAST_ENTRY);
+    EXPECT_TRUE(active);
 }
 
-TEST_F(RdrTest, InvalidTypesAreRefusedButSpendTheirId)
+// An active resource takes no records and spends no id; a record of a type
+// that cannot be added spends its id all the same.
+TEST_F(RdrTest, RefusedAddsLeaveTheRepositoryAlone)
 {
     KviLogCapture log(KVI_LOG_DBG_L_NUM);
     for (int type : {int(SAHPI_NO_RECORD), 9}) {
         SaHpiRdrT rdr{};
         storeRaw(rdr.RdrType, type);
-        KviDsRdrFnTable table{};
-        SaHpiEntryIdT recordId = 0;
-        KviCsRdrRecordNumT number{};
-        EXPECT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, &recordId, &number),
-                  SA_ERR_HPI_INVALID_PARAMS);
+        EXPECT_EQ(addRdr(rid_, SAHPI_NO_RECORD, {}, nullptr, SA_ERR_HPI_INVALID_PARAMS, &rdr), 0u);
         EXPECT_EQ(rdr.RecordId, 0u);
-        EXPECT_EQ(recordId, 0u);
         EXPECT_TRUE(log.contains("RdrType is invalid (" + std::to_string(type) + ")"));
     }
     EXPECT_EQ(addRdr(rid_, SAHPI_CTRL_RDR), 3u);
+
+    ASSERT_EQ(kviCsRptEntryActiveStateSetByRid(0, rid_, SAHPI_TRUE), SA_OK);
+    addRdr(rid_, SAHPI_SENSOR_RDR, {}, nullptr, SA_ERR_HPI_INVALID_REQUEST);
+    EXPECT_TRUE(log.contains("Can't add entries to active resources"));
+    EXPECT_EQ(nextRecordId(), 4u);
     EXPECT_EQ(walk(), (Ids{3}));
 }
 
@@ -211,17 +165,15 @@ TEST_F(RdrTest, LookupsCheckTheResourcesCapabilitiesThenTheRecordsType)
     EXPECT_TRUE(log.contains("Unknown RDR type (7)"));
 
     // A resource without any record capability is asked for none of them.
-    rid_ = addResource(SAHPI_TRUE, kTestMapl, KviDsRptFnTable{}, nullptr, testLock(),
+    rid_ = addResource(SAHPI_TRUE, kTestMapl, {}, nullptr, testLock(),
                        makeRptEntry(SAHPI_CAPABILITY_RESOURCE));
-    SaHpiBoolT active = SAHPI_FALSE;
-    EXPECT_EQ(kviCsRdrGetWatchdog(0, rid_, 1, nullptr, &active, nullptr, nullptr, nullptr, nullptr),
-              SA_ERR_HPI_INVALID_CMD);
-    EXPECT_EQ(kviCsRdrGetSensor(0, rid_, 1, nullptr, &active, nullptr, nullptr, nullptr, nullptr),
-              SA_ERR_HPI_INVALID_CMD);
-    EXPECT_EQ(kviCsRdrGetControl(0, rid_, 1, nullptr, &active, nullptr, nullptr, nullptr, nullptr),
-              SA_ERR_HPI_INVALID_CMD);
-    EXPECT_EQ(kviCsRdrGetEir(0, rid_, 1, nullptr, &active, nullptr, nullptr, nullptr, nullptr),
-              SA_ERR_HPI_INVALID_CMD);
+    SaHpiBoolT a = SAHPI_FALSE;
+    for (SaErrorT rc :
+         {kviCsRdrGetWatchdog(0, rid_, 1, nullptr, &a, nullptr, nullptr, nullptr, nullptr),
+          kviCsRdrGetSensor(0, rid_, 1, nullptr, &a, nullptr, nullptr, nullptr, nullptr),
+          kviCsRdrGetControl(0, rid_, 1, nullptr, &a, nullptr, nullptr, nullptr, nullptr),
+          kviCsRdrGetEir(0, rid_, 1, nullptr, &a, nullptr, nullptr, nullptr, nullptr)})
+        EXPECT_EQ(rc, SA_ERR_HPI_INVALID_CMD);
     for (const char *line :
          {"Resource does not support watchdogs", "Resource does not support sensors",
           "Resource does not support controls", "Resource does not support entity inventory"})
@@ -230,72 +182,47 @@ TEST_F(RdrTest, LookupsCheckTheResourcesCapabilitiesThenTheRecordsType)
     EXPECT_TRUE(log.contains("No Entries found."));
 }
 
-TEST_F(RdrTest, ReadsHandOutWhatIsNeededToCallThePlugin)
-{
-    int user = 0;
-    KviDsRdrFnTable table{};
-    table.WatchdogTimerReset = [](SaHpiDomainIdT, SaHpiResourceIdT, SaHpiWatchdogNumT,
-                                  void *) -> SaErrorT { return SA_OK; };
-    addRdr(rid_, SAHPI_WATCHDOG_RDR, table, &user);
-    SaHpiRdrT rdr{};
-    SaHpiBoolT active = SAHPI_TRUE;
-    void *userOut = nullptr;
-    KviDsRdrFnTable copy{};
-    SaHpiUint32T mapl = 0;
-    KviCsRwLockT *lock = nullptr;
-    ASSERT_EQ(kviCsRdrGetWatchdog(0, rid_, 1, &rdr, &active, &userOut, &copy, &mapl, &lock), SA_OK);
-    EXPECT_EQ(rdr.RdrTypeUnion.WatchdogRec.WatchdogNum, 1);
-    EXPECT_FALSE(active) << "records carry their resource's state";
-    EXPECT_EQ(userOut, &user);
-    EXPECT_EQ(copy.WatchdogTimerReset, table.WatchdogTimerReset);
-    EXPECT_EQ(mapl, kTestMapl);
-    EXPECT_EQ(lock, testLock());
-    ASSERT_EQ(kviCsRptEntryActiveStateSetByRid(0, rid_, SAHPI_TRUE), SA_OK);
-    ASSERT_EQ(kviCsRdrGetWatchdog(0, rid_, 1, nullptr, &active, nullptr, nullptr, nullptr, nullptr),
-              SA_OK);
-    EXPECT_TRUE(active);
-}
-
-TEST_F(RdrTest, UnknownResourcesDomainsAndNullArguments)
+TEST_F(RdrTest, UnknownResourcesDomainsAndNullArgumentsAreRefusedWithoutSpendingAnId)
 {
     SaHpiRdrT rdr = makeRdr(SAHPI_SENSOR_RDR);
     KviDsRdrFnTable table{};
-    SaHpiEntryIdT recordId = 0;
-    KviCsRdrRecordNumT number{};
+    SaHpiEntryIdT id = 0;
+    KviCsRdrRecordNumT num{};
     SaHpiBoolT active = SAHPI_FALSE;
     SaHpiEirIdT eir = 0;
     KviLogCapture log(KVI_LOG_DBG_L_NUM);
-    EXPECT_EQ(kviCsRdrAdd(0, 99, &rdr, nullptr, &table, &recordId, &number),
-              SA_ERR_HPI_NOT_PRESENT);
-    EXPECT_TRUE(log.contains("kviCsRptGetRptEntryContainer failed, returned -1013"));
-    EXPECT_EQ(kviCsRdrAdd(2, rid_, &rdr, nullptr, &table, &recordId, &number),
-              SA_ERR_HPI_INVALID_DOMAIN);
-    EXPECT_TRUE(log.contains("Invalid Domain"));
-    EXPECT_EQ(get(SAHPI_NO_RECORD, 1, &rdr), SA_ERR_HPI_NOT_PRESENT);
-    EXPECT_EQ(kviCsRdrGet(0, 99, SAHPI_NO_RECORD, 1, nullptr, &rdr, &active, nullptr, nullptr,
-                          nullptr, nullptr),
-              SA_ERR_HPI_INVALID_RESOURCE);
-    EXPECT_TRUE(log.contains("kviCsRptGetRptEntryContainer didn't return container, returned"));
-    EXPECT_EQ(kviCsDefaultEirSet(0, 99, 1), SA_ERR_HPI_INVALID_RESOURCE);
-    EXPECT_EQ(kviCsDefaultWatchdogGet(0, 99, &eir), SA_ERR_HPI_INVALID_RESOURCE);
-
-    EXPECT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, nullptr, &recordId, &number),
-              SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, nullptr, &number),
-              SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, &recordId, nullptr),
-              SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsRdrAdd(0, rid_, nullptr, nullptr, &table, &recordId, &number),
-              SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsRdrGet(0, rid_, SAHPI_NO_RECORD, 1, nullptr, &rdr, nullptr, nullptr, nullptr,
-                          nullptr, nullptr),
-              SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsDefaultEirGet(0, rid_, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    for (const char *line :
-         {"FnTable pointer is NULL.", "RecordId pointer is NULL.", "RecordNum pointer is NULL.",
-          "RdrEntry pointer is NULL.", "Active pointer is NULL.", "EirId pointer is NULL."})
-        EXPECT_TRUE(log.contains(line)) << line;
-    EXPECT_EQ(nextRecordId(rid_), 1u) << "refused calls spend no id";
+    const struct {
+        SaErrorT rc, expected;
+        const char *line;
+    } cases[] = {
+        {kviCsRdrAdd(0, 99, &rdr, nullptr, &table, &id, &num), SA_ERR_HPI_NOT_PRESENT,
+         "kviCsRptGetRptEntryContainer failed, returned -1013"},
+        {kviCsRdrAdd(2, rid_, &rdr, nullptr, &table, &id, &num), SA_ERR_HPI_INVALID_DOMAIN,
+         "Invalid Domain"},
+        {kviCsRdrGet(0, 99, SAHPI_NO_RECORD, 1, nullptr, &rdr, &active, nullptr, nullptr, nullptr,
+                     nullptr),
+         SA_ERR_HPI_INVALID_RESOURCE, "kviCsRptGetRptEntryContainer didn't return container"},
+        {kviCsDefaultEirSet(0, 99, 1), SA_ERR_HPI_INVALID_RESOURCE, ""},
+        {kviCsDefaultWatchdogGet(0, 99, &eir), SA_ERR_HPI_INVALID_RESOURCE, ""},
+        {get(SAHPI_NO_RECORD, 1, &rdr), SA_ERR_HPI_NOT_PRESENT, ""},
+        {kviCsRdrAdd(0, rid_, &rdr, nullptr, nullptr, &id, &num), SA_ERR_HPI_INVALID_PARAMS,
+         "FnTable pointer is NULL."},
+        {kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, nullptr, &num), SA_ERR_HPI_INVALID_PARAMS,
+         "RecordId pointer is NULL."},
+        {kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, &id, nullptr), SA_ERR_HPI_INVALID_PARAMS,
+         "RecordNum pointer is NULL."},
+        {kviCsRdrAdd(0, rid_, nullptr, nullptr, &table, &id, &num), SA_ERR_HPI_INVALID_PARAMS,
+         "RdrEntry pointer is NULL."},
+        {kviCsRdrGet(0, rid_, SAHPI_NO_RECORD, 1, nullptr, &rdr, nullptr, nullptr, nullptr, nullptr,
+                     nullptr),
+         SA_ERR_HPI_INVALID_PARAMS, "Active pointer is NULL."},
+        {kviCsDefaultEirGet(0, rid_, nullptr), SA_ERR_HPI_INVALID_PARAMS, "EirId pointer is NULL."},
+    };
+    for (const auto &c : cases) {
+        EXPECT_EQ(c.rc, c.expected) << c.line;
+        EXPECT_TRUE(log.contains(c.line)) << c.line;
+    }
+    EXPECT_EQ(nextRecordId(), 1u);
 }
 
 TEST_F(RdrTest, NumberZeroOfInventoryAndWatchdogNamesTheDefault)
@@ -317,32 +244,28 @@ TEST_F(RdrTest, NumberZeroOfInventoryAndWatchdogNamesTheDefault)
     EXPECT_EQ(kviCsDefaultWatchdogSet(0, rid_, 2), SA_ERR_HPI_NOT_PRESENT);
     EXPECT_EQ(kviCsDefaultEirSet(0, rid_, 9), SA_ERR_HPI_NOT_PRESENT);
 
-    SaHpiRdrT rdr{};
-    SaHpiBoolT active = SAHPI_FALSE;
-    ASSERT_EQ(kviCsRdrGetEir(0, rid_, SAHPI_DEFAULT_INVENTORY_ID, &rdr, &active, nullptr, nullptr,
+    SaHpiRdrT eir0{}, watchdog0{}, eir2{};
+    SaHpiBoolT a = SAHPI_FALSE;
+    ASSERT_EQ(kviCsRdrGetEir(0, rid_, SAHPI_DEFAULT_INVENTORY_ID, &eir0, &a, nullptr, nullptr,
                              nullptr, nullptr),
               SA_OK);
-    EXPECT_EQ(rdr.RecordId, 4u);
-    ASSERT_EQ(kviCsRdrGetWatchdog(0, rid_, SAHPI_DEFAULT_WATCHDOG_NUM, &rdr, &active, nullptr,
+    ASSERT_EQ(kviCsRdrGetWatchdog(0, rid_, SAHPI_DEFAULT_WATCHDOG_NUM, &watchdog0, &a, nullptr,
                                   nullptr, nullptr, nullptr),
               SA_OK);
-    EXPECT_EQ(rdr.RecordId, 5u);
-    ASSERT_EQ(kviCsRdrGetEir(0, rid_, 2, &rdr, &active, nullptr, nullptr, nullptr, nullptr), SA_OK);
-    EXPECT_EQ(rdr.RecordId, 2u);
+    ASSERT_EQ(kviCsRdrGetEir(0, rid_, 2, &eir2, &a, nullptr, nullptr, nullptr, nullptr), SA_OK);
+    EXPECT_EQ(eir0.RecordId, 4u);
+    EXPECT_EQ(watchdog0.RecordId, 5u);
+    EXPECT_EQ(eir2.RecordId, 2u);
 }
 
 TEST_F(RdrTest, HashSizeAppliesToRepositoriesMadeAfterIt)
 {
-    SaHpiUint32T size = 0;
     KviLogCapture log(KVI_LOG_DBG_L_NUM);
     EXPECT_EQ(kviCsRdrHashSizeSet(0), SA_ERR_HPI_INVALID_PARAMS);
     EXPECT_TRUE(log.contains("Hash size can't be set to 0!"));
     EXPECT_EQ(kviCsRdrHashSizeGet(nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("HashSize pointer is NULL."));
 
     ASSERT_EQ(kviCsRdrHashSizeSet(7), SA_OK);
-    ASSERT_EQ(kviCsRdrHashSizeGet(&size), SA_OK);
-    EXPECT_EQ(size, 7u);
     SaHpiResourceIdT old = rid_;
     rid_ = addResource(SAHPI_FALSE);
     ASSERT_EQ(kviCsRdrHashSizeSet(KVI_CS_DEFAULT_RDR_HASH_SIZE), SA_OK);
@@ -389,13 +312,8 @@ TEST_F(RdrTest, FailedAllocationsLeaveTheRepositoryAsItWasAndSpendTheId)
         SCOPED_TRACE(failing);
         SaHpiInt32T blocks = liveBlocks();
         KviLogCapture log(KVI_LOG_DBG_L_NUM);
-        SaHpiRdrT rdr = makeRdr(SAHPI_CTRL_RDR);
-        KviDsRdrFnTable table{};
-        SaHpiEntryIdT recordId = 0;
-        KviCsRdrRecordNumT number{};
         kviCsMemoryFailNthAllocation(failing);
-        EXPECT_EQ(kviCsRdrAdd(0, rid_, &rdr, nullptr, &table, &recordId, &number),
-                  SA_ERR_HPI_OUT_OF_SPACE);
+        addRdr(rid_, SAHPI_CTRL_RDR, {}, nullptr, SA_ERR_HPI_OUT_OF_SPACE);
         kviCsMemoryFailNthAllocation(0);
         EXPECT_TRUE(log.contains(line));
         EXPECT_EQ(liveBlocks(), blocks);

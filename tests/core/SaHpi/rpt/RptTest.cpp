@@ -1,25 +1,17 @@
 #include <chrono>
-#include <cstring>
 #include <string>
-#include <vector>
-
-#include <gtest/gtest.h>
+#include <tuple>
 
 #include "core/SaHpi/rpt/RptTestSupport.h"
-#include "support/KviTestSupport.h"
 
 namespace
 {
-using Ids = std::vector<SaHpiEntryIdT>;
-
-// What the pretend plug-in's removal slots saw, in call order.
-struct RemovalCall {
-    char kind; // 'P' for the resource, 'R' for a record
-    SaHpiResourceIdT resource;
-    void *user;
-    SaHpiBoolT active;
-};
-std::vector<RemovalCall> removals;
+// What the pretend plug-in's removal slots saw, in call order: "P<id>" for a
+// resource, "R<id>" for one of its records; and what the last resource
+// removal was given.
+std::vector<std::string> removals;
+void *removedUser = nullptr;
+SaHpiBoolT removedActive = SAHPI_TRUE;
 SaErrorT rptRemovalResult = SA_OK;
 
 SaErrorT recordRptRemoval(SaHpiDomainIdT, SaHpiResourceIdT ResourceId, SaHpiRptEntryT *RptEntry,
@@ -27,15 +19,10 @@ SaErrorT recordRptRemoval(SaHpiDomainIdT, SaHpiResourceIdT ResourceId, SaHpiRptE
 {
     EXPECT_EQ(RptEntry->ResourceId, ResourceId);
     EXPECT_EQ(FnTable->RptEntryResourcesRemove, &recordRptRemoval);
-    removals.push_back({'P', ResourceId, UserDefined, Active});
+    removals.push_back("P" + std::to_string(ResourceId));
+    removedUser = UserDefined;
+    removedActive = Active;
     return rptRemovalResult;
-}
-
-SaErrorT recordRdrRemoval(SaHpiDomainIdT, SaHpiResourceIdT ResourceId, SaHpiRdrT *, void *UserData,
-                          KviDsRdrFnTable *)
-{
-    removals.push_back({'R', ResourceId, UserData, SAHPI_FALSE});
-    return SA_OK;
 }
 
 KviDsRptFnTable recordingTable()
@@ -48,10 +35,9 @@ KviDsRptFnTable recordingTable()
 Ids activeWalk()
 {
     Ids ids;
-    SaHpiEntryIdT next = SAHPI_FIRST_ENTRY;
-    while (next != SAHPI_LAST_ENTRY) {
+    for (SaHpiEntryIdT next = SAHPI_FIRST_ENTRY; next != SAHPI_LAST_ENTRY;) {
         SaHpiRptEntryT entry{};
-        if (kviCsRptActiveEntryGet(SAHPI_DEFAULT_DOMAIN_ID, next, &next, &entry, nullptr) != SA_OK)
+        if (kviCsRptActiveEntryGet(0, next, &next, &entry, nullptr) != SA_OK)
             break;
         ids.push_back(entry.ResourceId);
     }
@@ -67,206 +53,128 @@ class RptTest : public ResourceModelTest
         removals.clear();
         rptRemovalResult = SA_OK;
     }
+    SaHpiRptEntryT stored(SaHpiResourceIdT Id)
+    {
+        SaHpiRptEntryT entry{};
+        EXPECT_EQ(kviCsRptEntryGetByRid(0, Id, &entry, &active_, nullptr), SA_OK);
+        return entry;
+    }
+    SaHpiBoolT active_ = SAHPI_FALSE;
 };
 
-TEST_F(RptTest, IdsStartAtOneAndAreNotReusedAfterRemoval)
+// Ids 1..7 land in lists 1, 2, 3, 4, 0, 1, 2 of five: the walk goes list by
+// list, and within a list by age. The active walk passes over inactive
+// entries, but one named directly is read all the same.
+TEST_F(RptTest, WalkGoesByListNumberThenByAgeAndTheActiveWalkSkipsInactiveEntries)
 {
-    SaHpiResourceIdT first = addResource(SAHPI_TRUE);
-    EXPECT_EQ(first, 1u);
-    ASSERT_EQ(kviCsRptEntryRemoveByRid(SAHPI_DEFAULT_DOMAIN_ID, first), SA_OK);
-    EXPECT_EQ(addResource(SAHPI_TRUE), 2u);
-}
-
-TEST_F(RptTest, WalkGoesByListNumberThenByAgeNotById)
-{
-    for (int i = 0; i < 7; i++)
-        addResource(SAHPI_TRUE);
-    EXPECT_EQ(walkRpt(), (Ids{5, 1, 6, 2, 7, 3, 4}));
-    EXPECT_EQ(activeWalk(), (Ids{5, 1, 6, 2, 7, 3, 4}));
-
     SaHpiEntryIdT next = 0;
-    SaHpiBoolT active = SAHPI_FALSE;
-    ASSERT_EQ(kviCsRptEntryGet(SAHPI_DEFAULT_DOMAIN_ID, 4, &next, nullptr, &active, nullptr),
-              SA_OK);
-    EXPECT_EQ(next, SAHPI_LAST_ENTRY);
-}
-
-TEST_F(RptTest, ActiveWalkSkipsInactiveEntriesButReadsAnyNamedOne)
-{
+    SaHpiRptEntryT entry{};
+    EXPECT_EQ(kviCsRptEntryGet(0, SAHPI_FIRST_ENTRY, &next, &entry, &active_, nullptr),
+              SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_EQ(kviCsRptEntryGet(0, SAHPI_LAST_ENTRY, &next, &entry, &active_, nullptr),
+              SA_ERR_HPI_INVALID_PARAMS);
+    EXPECT_EQ(kviCsRptActiveEntryGet(0, SAHPI_LAST_ENTRY, &next, &entry, nullptr),
+              SA_ERR_HPI_INVALID_PARAMS);
     for (int i = 1; i <= 7; i++)
         addResource(i == 5 || i == 2 || i == 4 ? SAHPI_FALSE : SAHPI_TRUE);
     EXPECT_EQ(walkRpt(), (Ids{5, 1, 6, 2, 7, 3, 4}));
     EXPECT_EQ(activeWalk(), (Ids{1, 6, 7, 3}));
-
-    // Named directly, an inactive entry is returned; the next id skips past
-    // the inactive ones, up to the end.
-    SaHpiEntryIdT next = 0;
-    SaHpiRptEntryT entry{};
-    ASSERT_EQ(kviCsRptActiveEntryGet(SAHPI_DEFAULT_DOMAIN_ID, 2, &next, &entry, nullptr), SA_OK);
+    ASSERT_EQ(kviCsRptActiveEntryGet(0, 2, &next, &entry, nullptr), SA_OK);
     EXPECT_EQ(entry.ResourceId, 2u);
     EXPECT_EQ(next, 7u);
-    ASSERT_EQ(kviCsRptActiveEntryGet(SAHPI_DEFAULT_DOMAIN_ID, 3, &next, &entry, nullptr), SA_OK);
+    ASSERT_EQ(kviCsRptActiveEntryGet(0, 3, &next, &entry, nullptr), SA_OK);
     EXPECT_EQ(next, SAHPI_LAST_ENTRY);
+
+    // Ids are not reused after a removal; an all-inactive table has no
+    // first active entry.
+    for (SaHpiResourceIdT id : {1, 3, 6, 7})
+        ASSERT_EQ(kviCsRptEntryRemoveByRid(0, id), SA_OK);
+    EXPECT_EQ(kviCsRptActiveEntryGet(0, SAHPI_FIRST_ENTRY, &next, &entry, nullptr),
+              SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_EQ(addResource(SAHPI_TRUE), 8u);
 }
 
-TEST_F(RptTest, EmptyOrAllInactiveTableHasNoFirstEntry)
-{
-    SaHpiEntryIdT next = 0;
-    SaHpiRptEntryT entry{};
-    SaHpiBoolT active = SAHPI_FALSE;
-    KviLogCapture log(KVI_LOG_DBG_L_NUM);
-    EXPECT_EQ(kviCsRptEntryGet(SAHPI_DEFAULT_DOMAIN_ID, SAHPI_FIRST_ENTRY, &next, &entry, &active,
-                               nullptr),
-              SA_ERR_HPI_NOT_PRESENT);
-    EXPECT_TRUE(log.contains("kviCsRptGetNextEntry failed.  Returned -1024"));
-    EXPECT_EQ(
-        kviCsRptActiveEntryGet(SAHPI_DEFAULT_DOMAIN_ID, SAHPI_FIRST_ENTRY, &next, &entry, nullptr),
-        SA_ERR_HPI_NOT_PRESENT);
-    addResource(SAHPI_FALSE);
-    EXPECT_EQ(
-        kviCsRptActiveEntryGet(SAHPI_DEFAULT_DOMAIN_ID, SAHPI_FIRST_ENTRY, &next, &entry, nullptr),
-        SA_ERR_HPI_NOT_PRESENT);
-}
-
-TEST_F(RptTest, ReadsRefuseTheLastEntryIdAndUnknownIds)
-{
-    addResource(SAHPI_TRUE);
-    SaHpiBoolT active = SAHPI_FALSE;
-    SaHpiRptEntryT entry{};
-    EXPECT_EQ(kviCsRptEntryGet(SAHPI_DEFAULT_DOMAIN_ID, SAHPI_LAST_ENTRY, nullptr, &entry, &active,
-                               nullptr),
-              SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(
-        kviCsRptActiveEntryGet(SAHPI_DEFAULT_DOMAIN_ID, SAHPI_LAST_ENTRY, nullptr, &entry, nullptr),
-        SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsRptEntryGetByRid(SAHPI_DEFAULT_DOMAIN_ID, 42, &entry, &active, nullptr),
-              SA_ERR_HPI_NOT_PRESENT);
-    EXPECT_EQ(kviCsRptActiveEntryGetByRid(SAHPI_DEFAULT_DOMAIN_ID, 42, &entry, nullptr, nullptr,
-                                          nullptr, nullptr),
-              SA_ERR_HPI_NOT_PRESENT);
-    KviLogCapture log(KVI_LOG_DBG_L_NUM);
-    EXPECT_EQ(kviCsRptEntryGetByRid(SAHPI_DEFAULT_DOMAIN_ID, 1, &entry, nullptr, nullptr),
-              SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("Active pointer is NULL."));
-}
-
-TEST_F(RptTest, ActiveLookupHandsOutWhatThePluginRegistered)
+// An entry is filled while inactive (modify replaces it under its own id and
+// keeps the plug-in's table when given none), then made active, which is
+// final; only an active entry takes tag and severity changes and is handed
+// out for calls.
+TEST_F(RptTest, EntriesAreFilledWhileInactiveAndOnlyEverBecomeActive)
 {
     int user = 0;
-    KviDsRptFnTable table = recordingTable();
-    SaHpiResourceIdT id = addResource(SAHPI_FALSE, kOtherMapl, table, &user, otherLock());
-    SaHpiRptEntryT entry{};
-    KviDsRptFnTable copy{};
-    void *userOut = nullptr;
-    SaHpiUint32T mapl = 0;
-    KviCsRwLockT *lock = nullptr;
-    EXPECT_EQ(kviCsRptActiveEntryGetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, &entry, &copy, &userOut,
-                                          &mapl, &lock),
-              SA_ERR_HPI_NOT_PRESENT);
-    ASSERT_EQ(kviCsRptEntryActiveStateSetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, SAHPI_TRUE), SA_OK);
-    ASSERT_EQ(kviCsRptActiveEntryGetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, &entry, &copy, &userOut,
-                                          &mapl, &lock),
-              SA_OK);
-    EXPECT_EQ(entry.ResourceId, id);
-    EXPECT_EQ(copy.RptEntryResourcesRemove, &recordRptRemoval);
-    EXPECT_EQ(userOut, &user);
-    EXPECT_EQ(mapl, kOtherMapl);
-    EXPECT_EQ(lock, otherLock());
-    ASSERT_EQ(kviCsRptEntryRemoveByRid(SAHPI_DEFAULT_DOMAIN_ID, id), SA_OK);
-}
-
-TEST_F(RptTest, EntriesOnlyGoFromInactiveToActive)
-{
-    SaHpiResourceIdT id = addResource(SAHPI_FALSE);
-    SaHpiTextBufferT tag = makeRptEntry().ResourceTag;
-    KviLogCapture log(KVI_LOG_DBG_L_NUM);
-    EXPECT_EQ(kviCsRptEntryModifyTagByRid(SAHPI_DEFAULT_DOMAIN_ID, id, &tag),
-              SA_ERR_HPI_NOT_PRESENT);
-    EXPECT_TRUE(log.contains("Called on Inactive Resource: " + std::to_string(id)));
-    EXPECT_EQ(kviCsRptEntryModifySeverityByRid(SAHPI_DEFAULT_DOMAIN_ID, id, SAHPI_MAJOR),
-              SA_ERR_HPI_NOT_PRESENT);
-    EXPECT_EQ(kviCsRptEntryActiveStateSetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, 2),
-              SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("Non-Bool value (2) in Active."));
-
-    ASSERT_EQ(kviCsRptEntryActiveStateSetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, SAHPI_TRUE), SA_OK);
-    EXPECT_EQ(kviCsRptEntryActiveStateSetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, SAHPI_TRUE), SA_OK);
-    EXPECT_EQ(kviCsRptEntryActiveStateSetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, SAHPI_FALSE),
-              SA_ERR_HPI_INVALID);
-    EXPECT_TRUE(log.contains("Transition to Inactive is invalid."));
-    EXPECT_EQ(kviCsRptEntryModifyByRid(SAHPI_DEFAULT_DOMAIN_ID, id, makeRptEntry(), nullptr),
-              SA_ERR_HPI_INVALID_REQUEST);
-    EXPECT_TRUE(log.contains("Entry Container is Active, refusing to modify."));
-    SaHpiBoolT active = SAHPI_FALSE;
-    ASSERT_EQ(kviCsRptEntryGetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, nullptr, &active, nullptr), SA_OK);
-    EXPECT_TRUE(active);
-}
-
-TEST_F(RptTest, ModifyReplacesAnInactiveEntryUnderItsOwnId)
-{
-    SaHpiResourceIdT id = addResource(SAHPI_FALSE, kTestMapl, recordingTable());
+    SaHpiResourceIdT id =
+        addResource(SAHPI_FALSE, kOtherMapl, recordingTable(), &user, otherLock());
     SaHpiRptEntryT replacement = makeRptEntry(SAHPI_CAPABILITY_SENSOR);
     replacement.EntryId = 99;
     replacement.ResourceId = 98;
-    replacement.ResourceSeverity = SAHPI_CRITICAL;
-    ASSERT_EQ(kviCsRptEntryModifyByRid(SAHPI_DEFAULT_DOMAIN_ID, id, replacement, nullptr), SA_OK);
-    SaHpiRptEntryT stored{};
-    SaHpiBoolT active = SAHPI_TRUE;
-    ASSERT_EQ(kviCsRptEntryGetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, &stored, &active, nullptr), SA_OK);
-    EXPECT_EQ(stored.EntryId, id);
-    EXPECT_EQ(stored.ResourceId, id);
-    EXPECT_EQ(stored.ResourceSeverity, SAHPI_CRITICAL);
-    EXPECT_EQ(stored.ResourceCapabilities, SAHPI_CAPABILITY_SENSOR);
-    EXPECT_FALSE(active);
+    ASSERT_EQ(kviCsRptEntryModifyByRid(0, id, replacement, nullptr), SA_OK);
+    SaHpiRptEntryT entry = stored(id);
+    EXPECT_EQ(entry.EntryId, id);
+    EXPECT_EQ(entry.ResourceId, id);
+    EXPECT_EQ(entry.ResourceCapabilities, SAHPI_CAPABILITY_SENSOR);
+    EXPECT_FALSE(active_);
 
-    // Without a table the plug-in's old one stays; with one it is replaced.
-    ASSERT_EQ(kviCsRptEntryRemoveByRid(SAHPI_DEFAULT_DOMAIN_ID, id), SA_OK);
-    EXPECT_EQ(removals.size(), 1u);
+    KviLogCapture log(KVI_LOG_DBG_L_NUM);
+    SaHpiTextBufferT tag = makeRptEntry().ResourceTag;
+    EXPECT_EQ(kviCsRptEntryModifyTagByRid(0, id, &tag), SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_EQ(kviCsRptEntryModifySeverityByRid(0, id, SAHPI_MAJOR), SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_EQ(kviCsRptActiveEntryGetByRid(0, id, &entry, nullptr, nullptr, nullptr, nullptr),
+              SA_ERR_HPI_NOT_PRESENT);
+    EXPECT_EQ(kviCsRptEntryActiveStateSetByRid(0, id, 2), SA_ERR_HPI_INVALID_PARAMS);
+    ASSERT_EQ(kviCsRptEntryActiveStateSetByRid(0, id, SAHPI_TRUE), SA_OK);
+    EXPECT_EQ(kviCsRptEntryActiveStateSetByRid(0, id, SAHPI_TRUE), SA_OK);
+    EXPECT_EQ(kviCsRptEntryActiveStateSetByRid(0, id, SAHPI_FALSE), SA_ERR_HPI_INVALID);
+    EXPECT_EQ(kviCsRptEntryModifyByRid(0, id, replacement, nullptr), SA_ERR_HPI_INVALID_REQUEST);
+    for (const std::string &line : {"Called on Inactive Resource: " + std::to_string(id),
+                                    std::string("Non-Bool value (2) in Active."),
+                                    std::string("Transition to Inactive is invalid."),
+                                    std::string("Entry Container is Active, refusing to modify.")})
+        EXPECT_TRUE(log.contains(line)) << line;
+
+    KviDsRptFnTable table{};
+    void *userOut = nullptr;
+    SaHpiUint32T mapl = 0;
+    KviCsRwLockT *lock = nullptr;
+    ASSERT_EQ(kviCsRptActiveEntryGetByRid(0, id, &entry, &table, &userOut, &mapl, &lock), SA_OK);
+    EXPECT_EQ(table.RptEntryResourcesRemove, &recordRptRemoval);
+    EXPECT_EQ(userOut, &user);
+    EXPECT_EQ(mapl, kOtherMapl);
+    EXPECT_EQ(lock, otherLock());
+
+    // A modify with a table replaces the plug-in's one.
     id = addResource(SAHPI_FALSE, kTestMapl, recordingTable());
-    KviDsRptFnTable empty{};
-    ASSERT_EQ(kviCsRptEntryModifyByRid(SAHPI_DEFAULT_DOMAIN_ID, id, replacement, &empty), SA_OK);
-    ASSERT_EQ(kviCsRptEntryRemoveByRid(SAHPI_DEFAULT_DOMAIN_ID, id), SA_OK);
-    EXPECT_EQ(removals.size(), 1u);
+    table = {};
+    ASSERT_EQ(kviCsRptEntryModifyByRid(0, id, replacement, &table), SA_OK);
+    ASSERT_EQ(kviCsRptEntryRemoveByRid(0, id), SA_OK);
+    EXPECT_TRUE(removals.empty());
 }
 
 TEST_F(RptTest, InvalidTagsAndSeveritiesAreRefusedBeforeTheLock)
 {
     SaHpiResourceIdT id = addResource(SAHPI_TRUE);
-    SaHpiTextBufferT badType = makeRptEntry().ResourceTag;
+    SaHpiTextBufferT badType = makeRptEntry().ResourceTag, badLanguage = badType;
     storeRaw(badType.DataType, 4);
-    SaHpiTextBufferT badLanguage = makeRptEntry().ResourceTag;
     storeRaw(badLanguage.Language, 137);
-
     // With the table held every call that waits for it would take seconds;
     // these return at once.
-    KviCsRptContainerT *rpt = nullptr;
-    ASSERT_EQ(kviCsRptLockRpt(SAHPI_DEFAULT_DOMAIN_ID, &rpt), SA_OK);
     KviLogCapture log(KVI_LOG_DBG_L_NUM);
     auto start = std::chrono::steady_clock::now();
-    EXPECT_EQ(kviCsRptEntryModifyTagByRid(SAHPI_DEFAULT_DOMAIN_ID, id, &badType),
-              SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsRptEntryModifyTagByRid(SAHPI_DEFAULT_DOMAIN_ID, id, &badLanguage),
-              SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsRptEntryModifyTagByRid(SAHPI_DEFAULT_DOMAIN_ID, id, nullptr),
-              SA_ERR_HPI_INVALID_PARAMS);
-    for (int severity : {5, 0xEF, 0xF1, 0xFF}) {
-        SCOPED_TRACE(severity);
-        EXPECT_EQ(kviCsRptEntryModifySeverityByRid(SAHPI_DEFAULT_DOMAIN_ID, id,
-                                                   static_cast<SaHpiSeverityT>(severity)),
-                  SA_ERR_HPI_INVALID_PARAMS);
-    }
+    withRpt([&](KviCsRptContainerT *) {
+        for (SaHpiTextBufferT *tag :
+             {&badType, &badLanguage, static_cast<SaHpiTextBufferT *>(nullptr)})
+            EXPECT_EQ(kviCsRptEntryModifyTagByRid(0, id, tag), SA_ERR_HPI_INVALID_PARAMS);
+        for (int severity : {5, 0xEF, 0xF1, 0xFF})
+            EXPECT_EQ(
+                kviCsRptEntryModifySeverityByRid(0, id, static_cast<SaHpiSeverityT>(severity)),
+                SA_ERR_HPI_INVALID_PARAMS)
+                << severity;
+    });
     EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(2));
-    kviCsRptUnlockRpt(rpt);
-    EXPECT_TRUE(log.contains("Invalid value (4) in Tag.DataType."));
-    EXPECT_TRUE(log.contains("Invalid value (137) in Tag.Language."));
-    EXPECT_TRUE(log.contains("Tag pointer is NULL."));
-    EXPECT_TRUE(log.contains("Invalid value for severity(5)"));
-
-    SaHpiRptEntryT stored{};
-    SaHpiBoolT active = SAHPI_FALSE;
-    ASSERT_EQ(kviCsRptEntryGetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, &stored, &active, nullptr), SA_OK);
-    EXPECT_EQ(stored.ResourceSeverity, SAHPI_MINOR);
-    EXPECT_EQ(stored.ResourceTag.Language, SAHPI_LANG_ENGLISH);
+    for (const char *line :
+         {"Invalid value (4) in Tag.DataType.", "Invalid value (137) in Tag.Language.",
+          "Tag pointer is NULL.", "Invalid value for severity(5)"})
+        EXPECT_TRUE(log.contains(line)) << line;
+    EXPECT_EQ(stored(id).ResourceSeverity, SAHPI_MINOR);
+    EXPECT_EQ(stored(id).ResourceTag.Language, SAHPI_LANG_ENGLISH);
 }
 
 TEST_F(RptTest, ReservedIdsAreRefusedByEveryChange)
@@ -279,68 +187,59 @@ TEST_F(RptTest, ReservedIdsAreRefusedByEveryChange)
     for (SaHpiResourceIdT id : {SAHPI_FIRST_ENTRY, SAHPI_LAST_ENTRY, SAHPI_UNSPECIFIED_RESOURCE_ID,
                                 SAHPI_DOMAIN_CONTROLLER_ID}) {
         SCOPED_TRACE(id);
-        EXPECT_EQ(kviCsRptEntryModifyByRid(SAHPI_DEFAULT_DOMAIN_ID, id, makeRptEntry(), nullptr),
-                  SA_ERR_HPI_INVALID_RESOURCE);
-        EXPECT_EQ(kviCsRptEntryRemoveByRid(SAHPI_DEFAULT_DOMAIN_ID, id),
-                  SA_ERR_HPI_INVALID_RESOURCE);
-        EXPECT_EQ(kviCsRptEntryUserPointerSetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, nullptr, &user),
-                  SA_ERR_HPI_INVALID_RESOURCE);
-        EXPECT_EQ(kviCsRptEntryUserPointerGetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, &user),
-                  SA_ERR_HPI_INVALID_RESOURCE);
-        EXPECT_EQ(kviCsRptEntryActiveStateSetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, SAHPI_TRUE),
-                  SA_ERR_HPI_INVALID_RESOURCE);
-        EXPECT_EQ(kviCsRptEntryModifyTagByRid(SAHPI_DEFAULT_DOMAIN_ID, id, &tag),
-                  SA_ERR_HPI_INVALID_RESOURCE);
-        EXPECT_EQ(kviCsRptEntryModifySeverityByRid(SAHPI_DEFAULT_DOMAIN_ID, id, SAHPI_OK),
-                  SA_ERR_HPI_INVALID_RESOURCE);
+        for (SaErrorT rc : {kviCsRptEntryModifyByRid(0, id, makeRptEntry(), nullptr),
+                            kviCsRptEntryRemoveByRid(0, id),
+                            kviCsRptEntryUserPointerSetByRid(0, id, nullptr, &user),
+                            kviCsRptEntryUserPointerGetByRid(0, id, &user),
+                            kviCsRptEntryActiveStateSetByRid(0, id, SAHPI_TRUE),
+                            kviCsRptEntryModifyTagByRid(0, id, &tag),
+                            kviCsRptEntryModifySeverityByRid(0, id, SAHPI_OK)})
+            EXPECT_EQ(rc, SA_ERR_HPI_INVALID_RESOURCE);
     }
-    EXPECT_TRUE(log.contains("Cannot use SAHPI_FIRST_ENTRY or SAHPI_LAST_ENTRY or "
-                             "SAHPI_UNSPECIFIED_RESOURCE_ID for Modify"));
+    EXPECT_EQ(log.matching("Cannot use SAHPI_FIRST_ENTRY or SAHPI_LAST_ENTRY or "
+                           "SAHPI_UNSPECIFIED_RESOURCE_ID for Modify")
+                  .size(),
+              28u);
     EXPECT_EQ(updateCount(), before);
     EXPECT_EQ(walkRpt(), (Ids{1}));
 }
 
+// Add, modify, activate, tag, severity and remove count once each; reads,
+// the user pointer and refused changes not at all.
 TEST_F(RptTest, EverySuccessfulChangeCountsOnceAndNothingElseCounts)
 {
-    SaHpiUint32T count = updateCount();
-    auto expectCount = [&](SaHpiUint32T added, const char *what) {
-        count += added;
-        EXPECT_EQ(updateCount(), count) << what;
-    };
+    const SaHpiUint32T base = updateCount();
+    auto counted = [base] { return updateCount() - base; };
     SaHpiResourceIdT id = addResource(SAHPI_FALSE);
-    expectCount(1, "add");
-    ASSERT_EQ(kviCsRptEntryModifyByRid(SAHPI_DEFAULT_DOMAIN_ID, id, makeRptEntry(), nullptr),
-              SA_OK);
-    expectCount(1, "modify");
-    ASSERT_EQ(kviCsRptEntryActiveStateSetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, SAHPI_TRUE), SA_OK);
-    expectCount(1, "activate");
+    EXPECT_EQ(counted(), 1u);
     SaHpiTextBufferT tag{};
     tag.DataType = SAHPI_TL_TYPE_BINARY;
     tag.Language = SAHPI_LANG_ZULU;
     tag.Data[254] = 'z'; // the whole buffer is taken, whatever its length says
-    ASSERT_EQ(kviCsRptEntryModifyTagByRid(SAHPI_DEFAULT_DOMAIN_ID, id, &tag), SA_OK);
-    expectCount(1, "tag");
-    ASSERT_EQ(kviCsRptEntryModifySeverityByRid(SAHPI_DEFAULT_DOMAIN_ID, id, SAHPI_DEBUG), SA_OK);
-    expectCount(1, "severity");
-    SaHpiRptEntryT stored{};
-    SaHpiBoolT active = SAHPI_FALSE;
-    ASSERT_EQ(kviCsRptEntryGetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, &stored, &active, nullptr), SA_OK);
-    EXPECT_EQ(memcmp(&stored.ResourceTag, &tag, sizeof tag), 0);
-    EXPECT_EQ(stored.ResourceSeverity, SAHPI_DEBUG);
+    EXPECT_EQ(kviCsRptEntryModifyByRid(0, id, makeRptEntry(), nullptr), SA_OK);
+    EXPECT_EQ(counted(), 2u);
+    EXPECT_EQ(kviCsRptEntryActiveStateSetByRid(0, id, SAHPI_TRUE), SA_OK);
+    EXPECT_EQ(counted(), 3u);
+    EXPECT_EQ(kviCsRptEntryModifyTagByRid(0, id, &tag), SA_OK);
+    EXPECT_EQ(counted(), 4u);
+    EXPECT_EQ(kviCsRptEntryModifySeverityByRid(0, id, SAHPI_DEBUG), SA_OK);
+    EXPECT_EQ(counted(), 5u);
+    SaHpiRptEntryT entry = stored(id);
+    EXPECT_EQ(memcmp(&entry.ResourceTag, &tag, sizeof tag), 0);
+    EXPECT_EQ(entry.ResourceSeverity, SAHPI_DEBUG);
 
     void *old = nullptr;
-    kviCsRptEntryUserPointerSetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, &old, &old);
-    kviCsRptEntryModifyByRid(SAHPI_DEFAULT_DOMAIN_ID, id, makeRptEntry(), nullptr);
-    kviCsRptEntryActiveStateSetByRid(SAHPI_DEFAULT_DOMAIN_ID, id, SAHPI_FALSE);
-    kviCsRptEntryRemoveByRid(SAHPI_DEFAULT_DOMAIN_ID, id + 1);
+    kviCsRptEntryUserPointerSetByRid(0, id, &old, &old);
+    kviCsRptEntryModifyByRid(0, id, makeRptEntry(), nullptr);
+    kviCsRptEntryActiveStateSetByRid(0, id, SAHPI_FALSE);
+    kviCsRptEntryRemoveByRid(0, id + 1);
     walkRpt();
-    expectCount(0, "reads, user pointer and refused changes");
-
+    EXPECT_EQ(counted(), 5u);
     SaHpiRptInfoT info{};
-    ASSERT_EQ(kviCsRptInfoGet(SAHPI_DEFAULT_DOMAIN_ID, &info), SA_OK);
+    ASSERT_EQ(kviCsRptInfoGet(0, &info), SA_OK);
     EXPECT_NE(info.UpdateTimestamp, SAHPI_TIME_UNSPECIFIED);
-    ASSERT_EQ(kviCsRptEntryRemoveByRid(SAHPI_DEFAULT_DOMAIN_ID, id), SA_OK);
-    expectCount(1, "remove");
+    ASSERT_EQ(kviCsRptEntryRemoveByRid(0, id), SA_OK);
+    EXPECT_EQ(counted(), 6u);
 }
 
 TEST_F(RptTest, IdsWrapPastZeroAndMaxSkippingIdsInUse)
@@ -357,34 +256,28 @@ TEST_F(RptTest, IdsWrapPastZeroAndMaxSkippingIdsInUse)
     EXPECT_EQ(walkRpt(), (Ids{1, 2, 0xFFFFFFFD, 3, SAHPI_DOMAIN_CONTROLLER_ID}));
 }
 
+// The entry, its list node, and the lists of its record repository.
 TEST_F(RptTest, FailedAllocationsLeaveTheTableAsItWasAndSpendTheId)
 {
     addResource(SAHPI_TRUE);
-    struct Case {
-        SaHpiInt32T failing;
-        SaErrorT result;
-        const char *line;
-    };
-    // The entry, its list node, and the lists of its record repository.
-    const Case cases[] = {
+    const std::tuple<SaHpiInt32T, SaErrorT, const char *> cases[] = {
         {1, SA_ERR_HPI_OUT_OF_SPACE, "Unable to allocate memory.  Returned -1007"},
         {2, SA_ERR_HPI_OUT_OF_SPACE, "Unable to allocate node.  Returned -1007"},
         {3, SA_ERR_HPI_ERROR, "kviCsRdrRepositoryContainerInitialize Returned -1007"},
     };
-    for (const Case &c : cases) {
-        SCOPED_TRACE(c.failing);
+    for (auto [failing, result, line] : cases) {
+        SCOPED_TRACE(failing);
         SaHpiInt32T blocks = liveBlocks();
         SaHpiUint32T count = updateCount();
         KviLogCapture log(KVI_LOG_DBG_L_NUM);
         KviDsRptFnTable table{};
         SaHpiResourceIdT id = 0;
-        kviCsMemoryFailNthAllocation(c.failing);
-        EXPECT_EQ(kviCsRptEntryAdd(SAHPI_DEFAULT_DOMAIN_ID, makeRptEntry(), nullptr, SAHPI_TRUE,
-                                   &table, kTestMapl, testLock(), &id),
-                  c.result);
+        kviCsMemoryFailNthAllocation(failing);
+        EXPECT_EQ(kviCsRptEntryAdd(0, makeRptEntry(), nullptr, 1, &table, 7, testLock(), &id),
+                  result);
         kviCsMemoryFailNthAllocation(0);
-        EXPECT_TRUE(log.contains(c.line));
-        EXPECT_EQ(id, SaHpiResourceIdT(c.failing + 1)) << "the id is handed out all the same";
+        EXPECT_TRUE(log.contains(line));
+        EXPECT_EQ(id, SaHpiResourceIdT(failing + 1)) << "the id is handed out all the same";
         EXPECT_EQ(liveBlocks(), blocks);
         EXPECT_EQ(updateCount(), count);
         EXPECT_EQ(walkRpt(), (Ids{1}));
@@ -392,66 +285,63 @@ TEST_F(RptTest, FailedAllocationsLeaveTheTableAsItWasAndSpendTheId)
     EXPECT_EQ(addResource(SAHPI_TRUE), 5u);
 }
 
-TEST_F(RptTest, NullArgumentsAndUnknownDomainsAreRefused)
+TEST_F(RptTest, NullArgumentsUnknownDomainsAndUnknownIdsAreRefused)
 {
     KviDsRptFnTable table{};
     SaHpiResourceIdT id = 0;
-    KviLogCapture log(KVI_LOG_DBG_L_NUM);
-    EXPECT_EQ(kviCsRptEntryAdd(SAHPI_DEFAULT_DOMAIN_ID, makeRptEntry(), nullptr, SAHPI_TRUE, &table,
-                               kTestMapl, testLock(), nullptr),
-              SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsRptEntryAdd(SAHPI_DEFAULT_DOMAIN_ID, makeRptEntry(), nullptr, SAHPI_TRUE,
-                               nullptr, kTestMapl, testLock(), &id),
-              SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviCsRptEntryAdd(SAHPI_DEFAULT_DOMAIN_ID, makeRptEntry(), nullptr, SAHPI_TRUE, &table,
-                               kTestMapl, nullptr, &id),
-              SA_ERR_HPI_INVALID_PARAMS);
-    for (const char *line :
-         {"ResourceId pointer is NULL.", "FnTable pointer is NULL.", "MaplLock pointer is NULL."})
-        EXPECT_TRUE(log.contains(line)) << line;
-    EXPECT_EQ(kviCsRptEntryAdd(1, makeRptEntry(), nullptr, SAHPI_TRUE, &table, kTestMapl,
-                               testLock(), &id),
-              SA_ERR_HPI_INVALID_DOMAIN);
-    EXPECT_TRUE(log.contains("kviCsRptLockRpt failed.  Returned -1022"));
     SaHpiRptInfoT info{};
-    EXPECT_EQ(kviCsRptInfoGet(1, &info), SA_ERR_HPI_INVALID_DOMAIN);
-    EXPECT_EQ(kviCsRptInfoGet(SAHPI_DEFAULT_DOMAIN_ID, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(walkRpt().empty());
-    EXPECT_EQ(addResource(SAHPI_TRUE), 1u);
-    EXPECT_EQ(kviCsRptEntryUserPointerGetByRid(SAHPI_DEFAULT_DOMAIN_ID, 1, nullptr),
-              SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("UserDefined pointer is NULL."));
-    EXPECT_EQ(kviCsRptEntryUserPointerSetByRid(SAHPI_DEFAULT_DOMAIN_ID, 1, &info, nullptr),
-              SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("OldPointer pointer is NULL."));
+    addResource(SAHPI_TRUE);
+    KviLogCapture log(KVI_LOG_DBG_L_NUM);
+    const SaHpiRptEntryT e = makeRptEntry();
+    const std::tuple<SaErrorT, SaErrorT, const char *> cases[] = {
+        {kviCsRptEntryAdd(0, e, nullptr, 1, &table, 7, testLock(), nullptr),
+         SA_ERR_HPI_INVALID_PARAMS, "ResourceId pointer is NULL."},
+        {kviCsRptEntryAdd(0, e, nullptr, 1, nullptr, 7, testLock(), &id), SA_ERR_HPI_INVALID_PARAMS,
+         "FnTable pointer is NULL."},
+        {kviCsRptEntryAdd(0, e, nullptr, 1, &table, 7, nullptr, &id), SA_ERR_HPI_INVALID_PARAMS,
+         "MaplLock pointer is NULL."},
+        {kviCsRptEntryGetByRid(0, 1, nullptr, nullptr, nullptr), SA_ERR_HPI_INVALID_PARAMS,
+         "Active pointer is NULL."},
+        {kviCsRptEntryUserPointerSetByRid(0, 1, &info, nullptr), SA_ERR_HPI_INVALID_PARAMS,
+         "OldPointer pointer is NULL."},
+        {kviCsRptEntryAdd(1, e, nullptr, 1, &table, 7, testLock(), &id), SA_ERR_HPI_INVALID_DOMAIN,
+         "kviCsRptLockRpt failed.  Returned -1022"},
+        {kviCsRptInfoGet(1, &info), SA_ERR_HPI_INVALID_DOMAIN, "Invalid Domain Id: 1"},
+        {kviCsRptActiveEntryGetByRid(0, 42, nullptr, nullptr, nullptr, nullptr, nullptr),
+         SA_ERR_HPI_NOT_PRESENT, "Unable to recover RPTEntryContainer.  Returned -1013"},
+    };
+    for (auto [rc, expected, line] : cases) {
+        EXPECT_EQ(rc, expected) << line;
+        EXPECT_TRUE(log.contains(line)) << line;
+    }
+    EXPECT_EQ(walkRpt(), (Ids{1}));
 }
 
-TEST_F(RptTest, RemovalCallsThePluginOnceAfterTheRecordsAreGone)
+TEST_F(RptTest, RemovalCallsThePluginOnceAfterTheRecordsAreGoneEvenWhenItFails)
 {
     int user = 0;
     SaHpiResourceIdT id = addResource(SAHPI_FALSE, kTestMapl, recordingTable(), &user);
     KviDsRdrFnTable rdrTable{};
-    rdrTable.RdrResourcesRemove = recordRdrRemoval;
+    rdrTable.RdrResourcesRemove = [](SaHpiDomainIdT, SaHpiResourceIdT Rid, SaHpiRdrT *, void *,
+                                     KviDsRdrFnTable *) {
+        removals.push_back("R" + std::to_string(Rid));
+        return SA_OK;
+    };
     addRdr(id, SAHPI_SENSOR_RDR, rdrTable);
     addRdr(id, SAHPI_CTRL_RDR, rdrTable);
-    ASSERT_EQ(kviCsRptEntryRemoveByRid(SAHPI_DEFAULT_DOMAIN_ID, id), SA_OK);
-    ASSERT_EQ(removals.size(), 3u);
-    EXPECT_EQ(removals[0].kind, 'R');
-    EXPECT_EQ(removals[1].kind, 'R');
-    EXPECT_EQ(removals[2].kind, 'P');
-    EXPECT_EQ(removals[2].user, &user);
-    EXPECT_EQ(removals[2].active, SAHPI_FALSE);
-    EXPECT_EQ(kviCsRptEntryRemoveByRid(SAHPI_DEFAULT_DOMAIN_ID, id), SA_ERR_HPI_NOT_PRESENT);
-}
+    ASSERT_EQ(kviCsRptEntryRemoveByRid(0, id), SA_OK);
+    EXPECT_EQ(removals, (std::vector<std::string>{"R1", "R1", "P1"}));
+    EXPECT_EQ(removedUser, &user);
+    EXPECT_EQ(removedActive, SAHPI_FALSE);
+    EXPECT_EQ(kviCsRptEntryRemoveByRid(0, id), SA_ERR_HPI_NOT_PRESENT);
 
-TEST_F(RptTest, AFailingPluginCleanupStillRemovesTheEntry)
-{
-    SaHpiResourceIdT id = addResource(SAHPI_TRUE, kTestMapl, recordingTable());
+    id = addResource(SAHPI_TRUE, kTestMapl, recordingTable());
     rptRemovalResult = SA_ERR_HPI_ERROR;
     KviLogCapture log(KVI_LOG_DBG_L_NUM | KVI_LOG_FUNC_OUT_NUM);
-    EXPECT_EQ(kviCsRptEntryRemoveByRid(SAHPI_DEFAULT_DOMAIN_ID, id), SA_ERR_HPI_UNKNOWN);
+    EXPECT_EQ(kviCsRptEntryRemoveByRid(0, id), SA_ERR_HPI_UNKNOWN);
     EXPECT_TRUE(log.contains("RptEntryResourcesRemove failed with rc=-1001; continuing"));
     EXPECT_TRUE(log.contains("errorsFound"));
+    EXPECT_EQ(removals.size(), 4u);
     EXPECT_TRUE(walkRpt().empty());
 }
 
@@ -459,43 +349,35 @@ TEST_F(RptTest, RemovingAPluginsEntriesTakesConsecutiveOnesToo)
 {
     // Walk order 5, 1, 6, 2, 7, 3, 4: entries 5 and 1, then 2 and 7 stand
     // next to each other, and so do 4 at the end and 5 at the start.
-    const SaHpiUint32T owner[] = {0,         kTestMapl, kTestMapl,  kOtherMapl,
-                                  kTestMapl, kTestMapl, kOtherMapl, kTestMapl};
     for (SaHpiResourceIdT id = 1; id <= 7; id++)
-        addResource(SAHPI_TRUE, owner[id], recordingTable(), nullptr,
-                    owner[id] == kTestMapl ? testLock() : otherLock());
-    ASSERT_EQ(kviCsRptEntrysRemoveByMapl(SAHPI_DEFAULT_DOMAIN_ID, kTestMapl), SA_OK);
+        addResource(SAHPI_TRUE, id == 3 || id == 6 ? kOtherMapl : kTestMapl, recordingTable(),
+                    nullptr, id == 3 || id == 6 ? otherLock() : testLock());
+    ASSERT_EQ(kviCsRptEntrysRemoveByMapl(0, kTestMapl), SA_OK);
     EXPECT_EQ(walkRpt(), (Ids{6, 3}));
-    ASSERT_EQ(removals.size(), 5u);
-    Ids removed;
-    for (const RemovalCall &call : removals)
-        removed.push_back(call.resource);
-    EXPECT_EQ(removed, (Ids{5, 1, 2, 7, 4}));
-
-    ASSERT_EQ(kviCsRptEntrysRemoveByLock(SAHPI_DEFAULT_DOMAIN_ID, otherLock()), SA_OK);
+    EXPECT_EQ(removals, (std::vector<std::string>{"P5", "P1", "P2", "P7", "P4"}));
+    ASSERT_EQ(kviCsRptEntrysRemoveByLock(0, otherLock()), SA_OK);
     EXPECT_TRUE(walkRpt().empty());
-    EXPECT_EQ(kviCsRptEntrysRemoveByMapl(SAHPI_DEFAULT_DOMAIN_ID, kTestMapl), SA_OK);
+    EXPECT_EQ(kviCsRptEntrysRemoveByMapl(0, kTestMapl), SA_OK);
 }
 
 TEST_F(RptTest, AFailureWhileUnloadingAPluginEndsTheProcess)
 {
     addResource(SAHPI_TRUE, kOtherMapl, recordingTable());
     rptRemovalResult = SA_ERR_HPI_ERROR;
-    expectFatalExit([] { kviCsRptEntrysRemoveByMapl(SAHPI_DEFAULT_DOMAIN_ID, kOtherMapl); },
+    expectFatalExit([] { kviCsRptEntrysRemoveByMapl(0, kOtherMapl); },
                     "Unable to unload an entry.  MaplNum(8) DomainId(0) ResourceId(1)");
     rptRemovalResult = SA_OK;
 }
 
 TEST_F(RptTest, AHeldTableMakesOtherCallsBusy)
 {
-    KviCsRptContainerT *rpt = nullptr;
-    ASSERT_EQ(kviCsRptLockRpt(SAHPI_DEFAULT_DOMAIN_ID, &rpt), SA_OK);
     KviLogCapture log(KVI_LOG_DBG_L_NUM);
-    SaHpiRptInfoT info{};
-    auto start = std::chrono::steady_clock::now();
-    EXPECT_EQ(kviCsRptInfoGet(SAHPI_DEFAULT_DOMAIN_ID, &info), SA_ERR_HPI_BUSY);
-    EXPECT_GE(std::chrono::steady_clock::now() - start, std::chrono::milliseconds(4900));
-    kviCsRptUnlockRpt(rpt);
+    withRpt([](KviCsRptContainerT *) {
+        SaHpiRptInfoT info{};
+        auto start = std::chrono::steady_clock::now();
+        EXPECT_EQ(kviCsRptInfoGet(0, &info), SA_ERR_HPI_BUSY);
+        EXPECT_GE(std::chrono::steady_clock::now() - start, std::chrono::milliseconds(4900));
+    });
     EXPECT_TRUE(log.contains("Unable to wait on semaphore, returned -1006"));
     EXPECT_TRUE(log.contains("kviCsRprLockRpt returned busy"));
 }

@@ -4,8 +4,6 @@
 #pragma once
 
 #include <cstring>
-#include <fstream>
-#include <iterator>
 #include <string>
 #include <vector>
 
@@ -15,6 +13,8 @@
 #include "core/utils/Memory.h"
 #include "support/KviTestSupport.h"
 
+using Ids = std::vector<SaHpiEntryIdT>;
+
 // Stores a number that is none of the enum's values, as a C caller can.
 template <typename Enum> void storeRaw(Enum &Field, SaHpiInt32T Value)
 {
@@ -22,21 +22,19 @@ template <typename Enum> void storeRaw(Enum &Field, SaHpiInt32T Value)
     memcpy(&Field, &Value, sizeof Value);
 }
 
-// Plug-in numbers the tests add resources for; each fixture removes their
-// entries when it ends, so the table is empty between tests.
+// Plug-in numbers and locks the tests add resources for (only a lock's
+// address matters to the table); each fixture removes their entries when it
+// ends, so the table is empty between tests.
 constexpr SaHpiUint32T kTestMapl = 7;
 constexpr SaHpiUint32T kOtherMapl = 8;
-
-// Only the address of a plug-in lock matters to the table.
+inline KviCsRwLockT kviTestPluginLocks[2];
 inline KviCsRwLockT *testLock()
 {
-    static KviCsRwLockT lock;
-    return &lock;
+    return &kviTestPluginLocks[0];
 }
 inline KviCsRwLockT *otherLock()
 {
-    static KviCsRwLockT lock;
-    return &lock;
+    return &kviTestPluginLocks[1];
 }
 
 inline void initResourceModel()
@@ -50,34 +48,33 @@ inline void initResourceModel()
     (void)done;
 }
 
-inline KviCsRptContainerT *rptContainer()
+// Runs Body with the table held.
+template <typename Body> void withRpt(Body body)
 {
     KviCsRptContainerT *rpt = nullptr;
-    EXPECT_EQ(kviCsGetRptContainerByDomainId(SAHPI_DEFAULT_DOMAIN_ID, &rpt), SA_OK);
-    return rpt;
+    ASSERT_EQ(kviCsRptLockRpt(0, &rpt), SA_OK);
+    body(rpt);
+    kviCsRptUnlockRpt(rpt);
 }
 
 // Points the id generator at Next, as if that many ids had been handed out.
 inline void setNextResourceId(SaHpiResourceIdT Next)
 {
-    KviCsRptContainerT *rpt = nullptr;
-    ASSERT_EQ(kviCsRptLockRpt(SAHPI_DEFAULT_DOMAIN_ID, &rpt), SA_OK);
-    rpt->LastResourceId = Next;
-    kviCsRptUnlockRpt(rpt);
+    withRpt([Next](KviCsRptContainerT *rpt) { rpt->LastResourceId = Next; });
 }
 
 inline SaHpiUint32T updateCount()
 {
     SaHpiRptInfoT info{};
-    EXPECT_EQ(kviCsRptInfoGet(SAHPI_DEFAULT_DOMAIN_ID, &info), SA_OK);
+    EXPECT_EQ(kviCsRptInfoGet(0, &info), SA_OK);
     return info.UpdateCount;
 }
 
-constexpr SaHpiCapabilitiesT kAllRdrCapabilities =
-    SAHPI_CAPABILITY_RESOURCE | SAHPI_CAPABILITY_RDR | SAHPI_CAPABILITY_CONTROL |
-    SAHPI_CAPABILITY_SENSOR | SAHPI_CAPABILITY_INVENTORY_DATA | SAHPI_CAPABILITY_WATCHDOG;
-
-inline SaHpiRptEntryT makeRptEntry(SaHpiCapabilitiesT Capabilities = kAllRdrCapabilities)
+inline SaHpiRptEntryT
+makeRptEntry(SaHpiCapabilitiesT Capabilities = SAHPI_CAPABILITY_RESOURCE | SAHPI_CAPABILITY_RDR |
+                                               SAHPI_CAPABILITY_CONTROL | SAHPI_CAPABILITY_SENSOR |
+                                               SAHPI_CAPABILITY_INVENTORY_DATA |
+                                               SAHPI_CAPABILITY_WATCHDOG)
 {
     SaHpiRptEntryT entry{};
     entry.ResourceCapabilities = Capabilities;
@@ -88,15 +85,12 @@ inline SaHpiRptEntryT makeRptEntry(SaHpiCapabilitiesT Capabilities = kAllRdrCapa
 }
 
 inline SaHpiResourceIdT addResource(SaHpiBoolT Active, SaHpiUint32T Mapl = kTestMapl,
-                                    const KviDsRptFnTable &FnTable = KviDsRptFnTable{},
-                                    void *UserDefined = nullptr, KviCsRwLockT *Lock = testLock(),
+                                    KviDsRptFnTable FnTable = {}, void *UserDefined = nullptr,
+                                    KviCsRwLockT *Lock = testLock(),
                                     SaHpiRptEntryT Entry = makeRptEntry())
 {
-    KviDsRptFnTable table = FnTable;
     SaHpiResourceIdT id = 0;
-    EXPECT_EQ(kviCsRptEntryAdd(SAHPI_DEFAULT_DOMAIN_ID, Entry, UserDefined, Active, &table, Mapl,
-                               Lock, &id),
-              SA_OK);
+    EXPECT_EQ(kviCsRptEntryAdd(0, Entry, UserDefined, Active, &FnTable, Mapl, Lock, &id), SA_OK);
     return id;
 }
 
@@ -107,30 +101,30 @@ inline SaHpiRdrT makeRdr(SaHpiRdrTypeT Type)
     return rdr;
 }
 
+// Adds a record; the expected result and the numbers handed out go through
+// the optional arguments.
 inline SaHpiEntryIdT addRdr(SaHpiResourceIdT ResourceId, SaHpiRdrTypeT Type,
-                            const KviDsRdrFnTable &FnTable = KviDsRdrFnTable{},
-                            void *UserDefined = nullptr)
+                            KviDsRdrFnTable FnTable = {}, void *UserDefined = nullptr,
+                            SaErrorT Expected = SA_OK, SaHpiRdrT *Rdr = nullptr,
+                            KviCsRdrRecordNumT *Number = nullptr)
 {
     SaHpiRdrT rdr = makeRdr(Type);
-    KviDsRdrFnTable table = FnTable;
-    SaHpiEntryIdT recordId = 0;
     KviCsRdrRecordNumT number{};
-    EXPECT_EQ(kviCsRdrAdd(SAHPI_DEFAULT_DOMAIN_ID, ResourceId, &rdr, UserDefined, &table, &recordId,
-                          &number),
-              SA_OK);
+    SaHpiEntryIdT recordId = 0;
+    EXPECT_EQ(kviCsRdrAdd(0, ResourceId, Rdr != nullptr ? Rdr : &rdr, UserDefined, &FnTable,
+                          &recordId, Number != nullptr ? Number : &number),
+              Expected);
     return recordId;
 }
 
 // The entry ids a client walking the whole table sees, in order.
-inline std::vector<SaHpiEntryIdT> walkRpt()
+inline Ids walkRpt()
 {
-    std::vector<SaHpiEntryIdT> ids;
-    SaHpiEntryIdT next = SAHPI_FIRST_ENTRY;
-    while (next != SAHPI_LAST_ENTRY) {
+    Ids ids;
+    for (SaHpiEntryIdT next = SAHPI_FIRST_ENTRY; next != SAHPI_LAST_ENTRY;) {
         SaHpiRptEntryT entry{};
         SaHpiBoolT active = SAHPI_FALSE;
-        if (kviCsRptEntryGet(SAHPI_DEFAULT_DOMAIN_ID, next, &next, &entry, &active, nullptr) !=
-            SA_OK)
+        if (kviCsRptEntryGet(0, next, &next, &entry, &active, nullptr) != SA_OK)
             break;
         ids.push_back(entry.ResourceId);
     }
@@ -140,13 +134,11 @@ inline std::vector<SaHpiEntryIdT> walkRpt()
 // Runs Body with the resource's record repository, under the RPT lock.
 template <typename Body> void withRepository(SaHpiResourceIdT ResourceId, Body body)
 {
-    KviCsRptContainerT *rpt = nullptr;
-    ASSERT_EQ(kviCsRptLockRpt(SAHPI_DEFAULT_DOMAIN_ID, &rpt), SA_OK);
-    KviCsRptEntryContainerT *entry = nullptr;
-    EXPECT_EQ(kviCsRptGetRptEntryContainer(rpt, ResourceId, &entry), SA_OK);
-    if (entry != nullptr)
+    withRpt([&](KviCsRptContainerT *rpt) {
+        KviCsRptEntryContainerT *entry = nullptr;
+        ASSERT_EQ(kviCsRptGetRptEntryContainer(rpt, ResourceId, &entry), SA_OK);
         body(&entry->RdrRepositoryContainer);
-    kviCsRptUnlockRpt(rpt);
+    });
 }
 
 // Runs Body in a child process that must end with exit status 1 after
@@ -155,22 +147,18 @@ template <typename Body> void withRepository(SaHpiResourceIdT ResourceId, Body b
 template <typename Body> void expectFatalExit(Body body, const std::string &Line)
 {
     GTEST_FLAG_SET(death_test_style, "fast");
-    KviTempDir dir;
-    std::string path = dir.file("fatal.log");
+    KviLogCapture log(KVI_LOG_DBG_L_NUM);
     EXPECT_EXIT(
         {
-            kviCsLogClose();
-            kviCsLogInitialize(KVI_LOG_DBG_L_NUM, path.c_str());
             body();
             exit(0);
         },
         testing::ExitedWithCode(1), "");
-    std::ifstream in(path);
-    std::string log((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
-    EXPECT_NE(log.find(Line), std::string::npos) << "missing: " << Line << "\nlog:\n" << log;
+    EXPECT_TRUE(log.contains(Line)) << Line;
 }
 
-// Sets up the resource model once and empties the table after every test.
+// Sets up the resource model once and empties the table after every test,
+// which must give back every block the test's entries took.
 class ResourceModelTest : public testing::Test
 {
   protected:
@@ -183,17 +171,12 @@ class ResourceModelTest : public testing::Test
     void TearDown() override
     {
         kviCsMemoryFailNthAllocation(0);
-        EXPECT_EQ(kviCsRptEntrysRemoveByMapl(SAHPI_DEFAULT_DOMAIN_ID, kTestMapl), SA_OK);
-        EXPECT_EQ(kviCsRptEntrysRemoveByMapl(SAHPI_DEFAULT_DOMAIN_ID, kOtherMapl), SA_OK);
+        EXPECT_EQ(kviCsRptEntrysRemoveByMapl(0, kTestMapl), SA_OK);
+        EXPECT_EQ(kviCsRptEntrysRemoveByMapl(0, kOtherMapl), SA_OK);
         EXPECT_TRUE(walkRpt().empty());
         EXPECT_EQ(liveBlocks(), liveBlocks_) << "the table leaked or freed too much";
     }
-    static SaHpiInt32T liveBlocks()
-    {
-        SaHpiInt32T n = 0;
-        kviCsGetMemorySegmentsAllocated(&n);
-        return n;
-    }
+    static SaHpiInt32T liveBlocks() { return kviTestLiveBlocks(); }
 
   private:
     SaHpiInt32T liveBlocks_ = 0;
