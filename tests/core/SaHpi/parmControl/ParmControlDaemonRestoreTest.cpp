@@ -1,4 +1,3 @@
-#include <cstdlib>
 #include <map>
 
 #include "tests/core/SaHpi/parmControl/ParmControlFixture.h"
@@ -15,150 +14,106 @@ using namespace pctest;
 // the library as a restarted daemon does: empty tables, resource ids counted
 // from 1 again, and only the store's directory left from the first run.
 
-// The test program links the library statically; the simulator resolves its
-// library names against the program, so each one it uses must be linked in.
-[[maybe_unused]] volatile const void *const SimulatorImports[] = {
-    reinterpret_cast<const void *>(&kviCsCfgDataUint32Get),
-    reinterpret_cast<const void *>(&kviCsDefaultEirSet),
-    reinterpret_cast<const void *>(&kviCsDefaultWatchdogSet),
-    reinterpret_cast<const void *>(&kviCsRdrAdd),
-    reinterpret_cast<const void *>(&kviCsRdrGetSensor),
-    reinterpret_cast<const void *>(&kviCsRdrGetWatchdog),
-    reinterpret_cast<const void *>(&kviCsRptEntryActiveStateSetByRid),
-    reinterpret_cast<const void *>(&kviCsRptEntryAdd),
-    reinterpret_cast<const void *>(&kviCsRptEntryGetByRid),
-    reinterpret_cast<const void *>(&kviCsRptEntryModifyByRid),
-    reinterpret_cast<const void *>(&kviCsRptEntryRemoveByRid),
-    reinterpret_cast<const void *>(&kviDsMaplManagerGetMaplLock),
-    reinterpret_cast<const void *>(&kviCsGetSaHpiTime),
-    reinterpret_cast<const void *>(&kviCsMalloc),
-    reinterpret_cast<const void *>(&kviCsFree),
-    reinterpret_cast<const void *>(&kviCsLogger),
-};
-
-std::string simulatorPath()
-{
-    const char *dir = getenv("KVI_TEST_BINARY_DIR");
-    return std::string(dir != nullptr ? dir : ".") + "/../plugins/libKviSimulator.so";
-}
-
 // The shelf as the library's tables show it, by resource tag and record
-// name, with what is needed to drive each record through its table.
+// name, with what is needed to drive each record through its table. A name
+// that is not there fails the test, and an empty record stands in for it.
 class Shelf
 {
   public:
     struct Record {
-        SaHpiRdrT Rdr;
-        KviDsRdrFnTable Fn;
-        void *UserData;
+        SaHpiRdrT Rdr{};
+        KviDsRdrFnTable Fn{};
+        void *UserData = nullptr;
+        SaHpiResourceIdT Rid = 0;
     };
 
-    Shelf()
+    // Reads the tables; a failure here ends the scenario's checks early.
+    void load()
     {
-        SaHpiEntryIdT entry = SAHPI_FIRST_ENTRY;
-        while (entry != SAHPI_LAST_ENTRY) {
+        for (SaHpiEntryIdT entry = SAHPI_FIRST_ENTRY; entry != SAHPI_LAST_ENTRY;) {
             SaHpiRptEntryT rpt{};
-            if (kviCsRptActiveEntryGet(0, entry, &entry, &rpt, nullptr) != SA_OK) {
-                ADD_FAILURE() << "no resources";
-                return;
-            }
+            ASSERT_EQ(kviCsRptActiveEntryGet(0, entry, &entry, &rpt, nullptr), SA_OK);
             rids_[str(rpt.ResourceTag)] = rpt.ResourceId;
-            SaHpiEntryIdT rdr = SAHPI_FIRST_ENTRY;
-            while (rdr != SAHPI_LAST_ENTRY) {
-                Record r{};
-                SaHpiBoolT active = SAHPI_FALSE;
-                if (kviCsRdrGet(0, rpt.ResourceId, SAHPI_NO_RECORD, rdr, &rdr, &r.Rdr, &active,
-                                &r.UserData, &r.Fn, nullptr, nullptr) != SA_OK)
-                    break;
-                records_[{rpt.ResourceId, str(r.Rdr.IdString)}] = r;
-            }
+            Record r{};
+            r.Rid = rpt.ResourceId;
+            SaHpiBoolT active = SAHPI_FALSE;
+            for (SaHpiEntryIdT rdr = SAHPI_FIRST_ENTRY;
+                 rdr != SAHPI_LAST_ENTRY &&
+                 kviCsRdrGet(0, r.Rid, SAHPI_NO_RECORD, rdr, &rdr, &r.Rdr, &active, &r.UserData,
+                             &r.Fn, nullptr, nullptr) == SA_OK;)
+                records_[{r.Rid, str(r.Rdr.IdString)}] = r;
         }
     }
 
-    SaHpiResourceIdT rid(const std::string &Tag) const
+    SaHpiResourceIdT rid(const std::string &Tag)
     {
-        auto it = rids_.find(Tag);
-        EXPECT_NE(it, rids_.end()) << Tag;
-        return it == rids_.end() ? 0 : it->second;
+        EXPECT_EQ(rids_.count(Tag), 1u) << Tag;
+        return rids_[Tag];
     }
-    // A record that is not there is a failure, and the callers then leave it
-    // alone rather than call through an empty table.
-    Record *rec(SaHpiResourceIdT Rid, const std::string &Name)
+    Record &rec(SaHpiResourceIdT Rid, const std::string &Name)
     {
-        auto it = records_.find({Rid, Name});
-        EXPECT_NE(it, records_.end()) << Name;
-        return it == records_.end() ? nullptr : &it->second;
+        EXPECT_EQ(records_.count({Rid, Name}), 1u) << Name;
+        return records_[{Rid, Name}];
     }
 
     SaHpiSensorThresholdsT thresholds(SaHpiResourceIdT Rid, const std::string &Name)
     {
-        Record *r = rec(Rid, Name);
+        Record &r = rec(Rid, Name);
         SaHpiSensorThresholdsT t{};
-        if (r == nullptr)
-            return t;
-        EXPECT_EQ(r->Fn.SensorThresholdsGet(0, Rid, r->Rdr.RdrTypeUnion.SensorRec.Num, &r->Rdr,
-                                            r->UserData, &t),
-                  SA_OK);
+        if (r.Fn.SensorThresholdsGet != nullptr) {
+            EXPECT_EQ(r.Fn.SensorThresholdsGet(0, Rid, num(r), &r.Rdr, r.UserData, &t), SA_OK);
+        }
         return t;
     }
     SaHpiSensorEvtEnablesT enables(SaHpiResourceIdT Rid, const std::string &Name)
     {
-        Record *r = rec(Rid, Name);
+        Record &r = rec(Rid, Name);
         SaHpiSensorEvtEnablesT e{};
-        if (r == nullptr)
-            return e;
-        EXPECT_EQ(r->Fn.SensorEventEnablesGet(0, Rid, r->Rdr.RdrTypeUnion.SensorRec.Num,
-                                              r->UserData, 0,
-                                              r->Rdr.RdrTypeUnion.SensorRec.Category, &e),
-                  SA_OK);
+        if (r.Fn.SensorEventEnablesGet != nullptr) {
+            EXPECT_EQ(r.Fn.SensorEventEnablesGet(0, Rid, num(r), r.UserData, 0,
+                                                 r.Rdr.RdrTypeUnion.SensorRec.Category, &e),
+                      SA_OK);
+        }
         return e;
     }
     SaHpiCtrlStateT control(SaHpiResourceIdT Rid, const std::string &Name)
     {
-        Record *r = rec(Rid, Name);
-        SaHpiCtrlStateT s{};
-        if (r == nullptr)
-            return s;
-        s.Type = r->Rdr.RdrTypeUnion.CtrlRec.Type;
-        EXPECT_EQ(r->Fn.ControlStateGet(0, Rid, r->Rdr.RdrTypeUnion.CtrlRec.Num, r->UserData, &s),
-                  SA_OK);
+        Record &r = rec(Rid, Name);
+        SaHpiCtrlStateT s{r.Rdr.RdrTypeUnion.CtrlRec.Type, {}};
+        if (r.Fn.ControlStateGet != nullptr) {
+            EXPECT_EQ(r.Fn.ControlStateGet(0, Rid, num(r), r.UserData, &s), SA_OK);
+        }
         return s;
     }
 
     // What saHpiSensorThresholdsSet, saHpiSensorEventEnablesSet and
     // saHpiControlStateSet do once the plug-in has taken the value: keep the
-    // daemon's copy.
+    // daemon's copy. A change on the plug-in's own side keeps none.
     void setThresholds(SaHpiResourceIdT Rid, const std::string &Name, SaHpiSensorThresholdsT T,
-                       bool KeepDaemonCopy = true)
+                       bool ThroughTheApi = true)
     {
-        Record *r = rec(Rid, Name);
-        if (r == nullptr)
-            return;
-        SaHpiSensorNumT num = r->Rdr.RdrTypeUnion.SensorRec.Num;
-        ASSERT_EQ(r->Fn.SensorThresholdsSet(0, Rid, num, &r->Rdr, &T, r->UserData), SA_OK);
-        if (KeepDaemonCopy) {
-            ASSERT_EQ(kviCsSaveThreshNV(0, Rid, num, SAHPI_TRUE, &T), SA_OK);
+        Record &r = rec(Rid, Name);
+        ASSERT_NE(r.Fn.SensorThresholdsSet, nullptr);
+        ASSERT_EQ(r.Fn.SensorThresholdsSet(0, Rid, num(r), &r.Rdr, &T, r.UserData), SA_OK);
+        if (ThroughTheApi) {
+            ASSERT_EQ(kviCsSaveThreshNV(0, Rid, num(r), SAHPI_TRUE, &T), SA_OK);
         }
     }
     void setEnables(SaHpiResourceIdT Rid, const std::string &Name, SaHpiSensorEvtEnablesT E)
     {
-        Record *r = rec(Rid, Name);
-        if (r == nullptr)
-            return;
-        SaHpiSensorNumT num = r->Rdr.RdrTypeUnion.SensorRec.Num;
-        ASSERT_EQ(r->Fn.SensorEventEnablesSet(0, Rid, num, &E, &r->Rdr, 0, r->UserData), SA_OK);
-        ASSERT_EQ(kviCsSaveEvtEnablesNV(0, Rid, num, SAHPI_TRUE, &E), SA_OK);
+        Record &r = rec(Rid, Name);
+        ASSERT_NE(r.Fn.SensorEventEnablesSet, nullptr);
+        ASSERT_EQ(r.Fn.SensorEventEnablesSet(0, Rid, num(r), &E, &r.Rdr, 0, r.UserData), SA_OK);
+        ASSERT_EQ(kviCsSaveEvtEnablesNV(0, Rid, num(r), SAHPI_TRUE, &E), SA_OK);
     }
     void setControl(SaHpiResourceIdT Rid, const std::string &Name, SaHpiCtrlStateT S,
-                    bool KeepDaemonCopy = true)
+                    bool ThroughTheApi = true)
     {
-        Record *r = rec(Rid, Name);
-        if (r == nullptr)
-            return;
-        SaHpiCtrlNumT num = r->Rdr.RdrTypeUnion.CtrlRec.Num;
-        ASSERT_EQ(r->Fn.ControlStateSet(0, Rid, num, &S, r->UserData), SA_OK);
-        if (KeepDaemonCopy) {
-            ASSERT_EQ(kviCsSaveCtrlStateNV(0, Rid, num, SAHPI_TRUE, &S), SA_OK);
+        Record &r = rec(Rid, Name);
+        ASSERT_NE(r.Fn.ControlStateSet, nullptr);
+        ASSERT_EQ(r.Fn.ControlStateSet(0, Rid, num(r), &S, r.UserData), SA_OK);
+        if (ThroughTheApi) {
+            ASSERT_EQ(kviCsSaveCtrlStateNV(0, Rid, num(r), SAHPI_TRUE, &S), SA_OK);
         }
     }
 
@@ -174,21 +129,25 @@ class Shelf
                        : kviCsRptRestoreParmControl(0, Rid, &fn, user, SAHPI_FALSE),
                   SA_OK);
         for (auto &[key, r] : records_) {
+            SCOPED_TRACE(key.second);
             if (key.first != Rid)
                 continue;
-            SCOPED_TRACE(key.second);
-            SaErrorT rc = SA_OK;
-            if (r.Rdr.RdrType == SAHPI_SENSOR_RDR)
-                rc = Save ? kviCsRdrSaveSensorParmControl(0, Rid, &r.Rdr, &r.Fn, r.UserData)
-                          : kviCsRdrRestoreSensor(0, Rid, SAHPI_FALSE, &r.Rdr, &r.Fn, r.UserData);
-            else if (r.Rdr.RdrType == SAHPI_CTRL_RDR)
-                rc = Save ? kviCsRdrSaveCtrlParmControl(0, Rid, &r.Rdr, &r.Fn, r.UserData)
-                          : kviCsRdrRestoreCtrl(0, Rid, SAHPI_FALSE, &r.Rdr, &r.Fn, r.UserData);
-            EXPECT_EQ(rc, SA_OK);
+            if (r.Rdr.RdrType == SAHPI_SENSOR_RDR) {
+                EXPECT_EQ(Save ? kviCsRdrSaveSensorParmControl(0, Rid, &r.Rdr, &r.Fn, r.UserData)
+                               : kviCsRdrRestoreSensor(0, Rid, 0, &r.Rdr, &r.Fn, r.UserData),
+                          SA_OK);
+            } else if (r.Rdr.RdrType == SAHPI_CTRL_RDR) {
+                EXPECT_EQ(Save ? kviCsRdrSaveCtrlParmControl(0, Rid, &r.Rdr, &r.Fn, r.UserData)
+                               : kviCsRdrRestoreCtrl(0, Rid, 0, &r.Rdr, &r.Fn, r.UserData),
+                          SA_OK);
+            }
         }
     }
 
   private:
+    // Sensor and control numbers sit first in the record's union alike.
+    static SaHpiUint8T num(const Record &R) { return R.Rdr.RdrTypeUnion.CtrlRec.Num; }
+
     std::map<std::string, SaHpiResourceIdT> rids_;
     std::map<std::pair<SaHpiResourceIdT, std::string>, Record> records_;
 };
@@ -200,13 +159,6 @@ SaHpiCtrlStateT analog(SaHpiCtrlStateAnalogT Value)
     return s;
 }
 
-SaHpiCtrlStateT discrete(SaHpiCtrlStateDiscreteT Value)
-{
-    SaHpiCtrlStateT s{SAHPI_CTRL_TYPE_DISCRETE, {}};
-    s.StateUnion.Discrete = Value;
-    return s;
-}
-
 SaHpiSensorThresholdsT upperLimits(SaHpiUint32T Minor, SaHpiUint32T Major)
 {
     SaHpiSensorThresholdsT t{};
@@ -215,7 +167,9 @@ SaHpiSensorThresholdsT upperLimits(SaHpiUint32T Minor, SaHpiUint32T Major)
     return t;
 }
 
-// One run of the daemon: start, discover, the scenario, stop.
+// One run of the daemon: start, discover, the scenario, stop. The child's
+// failed expectations and error lines go to its standard error, which the
+// parent shows when the run fails.
 template <typename Scenario> void daemonRun(const std::string &Config, Scenario scenario)
 {
     EXPECT_EXIT(
@@ -228,9 +182,10 @@ template <typename Scenario> void daemonRun(const std::string &Config, Scenario 
             EXPECT_EQ(saHpiInitialize(&version), SA_OK);
             EXPECT_EQ(saHpiSessionOpen(SAHPI_DEFAULT_DOMAIN_ID, &session, nullptr), SA_OK);
             EXPECT_EQ(saHpiResourcesDiscover(session), SA_OK);
-            scenario();
+            Shelf shelf;
+            shelf.load();
+            scenario(shelf, shelf.rid("Chassis 1"), shelf.rid("Processor board 1"));
             EXPECT_EQ(saHpiFinalize(), SA_OK);
-            // The parent shows the child's standard error when it fails.
             const testing::TestResult *result =
                 testing::UnitTest::GetInstance()->current_test_info()->result();
             for (int i = 0; i < result->total_part_count(); i++)
@@ -247,15 +202,11 @@ TEST(DaemonRestoreDeathTest, ARestartedDaemonPutsBackWhatClientsChangedOnTheSimu
 {
     KviTempDir dir;
     const std::string config =
-        dir.write("kvi.conf", "mapl_modules = \"" + simulatorPath() + "\"\nKviNvStorageDir = \"" +
+        dir.write("kvi.conf", "mapl_modules = \"" KVI_SIMULATOR_PATH "\"\nKviNvStorageDir = \"" +
                                   dir.file("nv") +
                                   "\"\nmax_mapl_count = \"2\"\nmax_mapl_rwlocks_count = \"2\"\n");
 
-    daemonRun(config, [] {
-        Shelf shelf;
-        SaHpiResourceIdT chassis = shelf.rid("Chassis 1"), board = shelf.rid("Processor board 1");
-        ASSERT_TRUE(chassis != 0 && board != 0);
-
+    daemonRun(config, [](Shelf &shelf, SaHpiResourceIdT chassis, SaHpiResourceIdT board) {
         // The operating mode and a 12V limit change on the plug-in's side,
         // not through an HPI call, so the daemon keeps no copy of them; an
         // operator then saves the chassis and the board explicitly.
@@ -269,17 +220,14 @@ TEST(DaemonRestoreDeathTest, ARestartedDaemonPutsBackWhatClientsChangedOnTheSimu
         EXPECT_EQ(kviCsRptEntryModifyTagByRid(0, chassis, &tag), SA_OK);
         EXPECT_EQ(kviCsRptEntryModifySeverityByRid(0, chassis, SAHPI_MINOR), SA_OK);
         shelf.setThresholds(chassis, "Inlet temperature", upperLimits(36, 42));
+        const SaHpiEventStateT upper =
+            SAHPI_ES_UPPER_MINOR | SAHPI_ES_UPPER_MAJOR | SAHPI_ES_UPPER_CRIT;
         shelf.setEnables(chassis, "Inlet temperature",
-                         {SAHPI_SENSTAT_EVENTS_ENABLED,
-                          SAHPI_ES_UPPER_MINOR | SAHPI_ES_UPPER_MAJOR | SAHPI_ES_UPPER_CRIT,
-                          SAHPI_ES_UPPER_MINOR | SAHPI_ES_UPPER_MAJOR | SAHPI_ES_UPPER_CRIT});
+                         {SAHPI_SENSTAT_EVENTS_ENABLED, upper, upper});
         shelf.setControl(chassis, "Display brightness", analog(30));
     });
 
-    daemonRun(config, [] {
-        Shelf shelf;
-        SaHpiResourceIdT chassis = shelf.rid("Chassis 1"), board = shelf.rid("Processor board 1");
-        ASSERT_TRUE(chassis != 0 && board != 0);
+    daemonRun(config, [](Shelf &shelf, SaHpiResourceIdT chassis, SaHpiResourceIdT board) {
         // The plug-in starts from its own defaults.
         EXPECT_EQ(shelf.control(chassis, "Display brightness").StateUnion.Analog, 75);
         EXPECT_EQ(shelf.thresholds(chassis, "Inlet temperature").UpMajor.Raw, 40u);
@@ -314,21 +262,14 @@ TEST(DaemonRestoreDeathTest, ARestartedDaemonPutsBackWhatClientsChangedOnTheSimu
     });
 }
 
+// ---------------------------------------------------------------------------
+// The restore on the fake plug-in.
+
 class DaemonRestoreTest : public ParmControlTest
 {
   protected:
-    Record sensor(SaHpiSensorThdMaskT Writable = 0x3F)
-    {
-        return {sensorRdr(SAHPI_TRUE, SAHPI_SEC_PER_EVENT, Writable), sensorTable(), fake()};
-    }
-    Record control(SaHpiBoolT Ignore = SAHPI_FALSE)
-    {
-        return {ctrlRdr(SAHPI_CTRL_TYPE_DISCRETE, Ignore), ctrlTable(), fake()};
-    }
-
-    // What an HPI call that changed the settings left in the store.
-    void changedThroughTheApi(SaHpiResourceIdT Rid, SaHpiBoolT Flag, const char *Tag,
-                              SaHpiSeverityT Severity)
+    // What the HPI calls that changed the settings left in the store.
+    void changed(SaHpiResourceIdT Rid, SaHpiBoolT Flag, const char *Tag, SaHpiSeverityT Severity)
     {
         SaHpiTextBufferT tag = text(Tag);
         ASSERT_EQ(kviCsSaveResTagNV(DOM, Rid, Flag, &tag), SA_OK);
@@ -345,148 +286,95 @@ class DaemonRestoreTest : public ParmControlTest
     void changedControl(SaHpiResourceIdT Rid, SaHpiCtrlNumT Num, SaHpiBoolT Flag,
                         SaHpiCtrlStateDiscreteT Value)
     {
-        SaHpiCtrlStateT state{SAHPI_CTRL_TYPE_DISCRETE, {}};
-        state.StateUnion.Discrete = Value;
+        SaHpiCtrlStateT state = discrete(Value);
         ASSERT_EQ(kviCsSaveCtrlStateNV(DOM, Rid, Num, Flag, &state), SA_OK);
     }
 };
 
-TEST_F(DaemonRestoreTest, PutsBackTheDaemonsCopyOnEveryActiveResource)
-{
-    Record s = sensor(), c = control();
-    SaHpiResourceIdT first = addResource({&s, &c}, "discovered one", SAHPI_MINOR);
-    SaHpiResourceIdT second = addResource({}, "discovered two", SAHPI_MINOR);
-    changedThroughTheApi(first, SAHPI_TRUE, "changed one", SAHPI_CRITICAL);
-    changedSensor(first, 1, SAHPI_TRUE, 40, 0x5);
-    changedControl(first, 2, SAHPI_TRUE, 77);
-    changedThroughTheApi(second, SAHPI_TRUE, "changed two", SAHPI_MAJOR);
-    restartStore();
-
-    KviLogCapture log;
-    ASSERT_EQ(kviCsDaemonRestoreDomain(DOM), SA_OK);
-    EXPECT_EQ(str(entry(first).ResourceTag), "changed one");
-    EXPECT_EQ(entry(first).ResourceSeverity, SAHPI_CRITICAL);
-    EXPECT_EQ(str(entry(second).ResourceTag), "changed two");
-    EXPECT_EQ(entry(second).ResourceSeverity, SAHPI_MAJOR);
-    SaHpiSensorThresholdsT expected = thresholds(40);
-    EXPECT_TRUE(same(&s.State->Thresholds, &expected, sizeof expected));
-    EXPECT_EQ(s.State->Enables.AssertEvents, 0x5);
-    EXPECT_EQ(s.State->CapabilitiesSeen, entry(first).ResourceCapabilities);
-    EXPECT_EQ(c.State->Ctrl.StateUnion.Discrete, 77u);
-    EXPECT_TRUE(
-        loggedAt(log, KVI_LOG_DBG_L_NUM,
-                 "Calling kviIsParmControlDeamonRestore Dom 0, ResId " + std::to_string(first)));
-}
-
 // Only settings changed through the API are put back: a resource never
-// touched keeps what its plug-in reported, and an explicit save's copy is
-// not the daemon's.
-TEST_F(DaemonRestoreTest, SettingsNeverChangedKeepWhatThePlugInReported)
+// touched keeps what its plug-in reported, an explicit save's copy is not
+// the daemon's, and an ignored control keeps its state whatever was saved.
+TEST_F(DaemonRestoreTest, SettingsNeverChangedAndIgnoredControlsKeepWhatThePlugInReported)
 {
-    Record s = sensor(), c = control();
-    s.State->Thresholds = thresholds(1);
+    Record s = sensor(), c = control(), ignored = control(SAHPI_CTRL_TYPE_DISCRETE, SAHPI_TRUE);
     c.State->Ctrl.StateUnion.Discrete = 3;
-    SaHpiResourceIdT rid = addResource({&s, &c}, "discovered", SAHPI_MINOR);
-    changedThroughTheApi(rid, SAHPI_FALSE, "explicitly saved", SAHPI_CRITICAL);
+    ignored.State->Ctrl.StateUnion.Discrete = 4;
+    SaHpiResourceIdT rid = addResource({&s, &c, &ignored}, "discovered", SAHPI_MINOR);
+    changed(rid, SAHPI_FALSE, "explicitly saved", SAHPI_CRITICAL);
     changedSensor(rid, 1, SAHPI_FALSE, 90, 0x1);
     changedControl(rid, 2, SAHPI_FALSE, 99);
-
+    changedControl(rid, 3, SAHPI_TRUE, 8);
     KviLogCapture log;
     ASSERT_EQ(kviCsParmControlDeamonRestore(DOM, rid), SA_OK);
     EXPECT_EQ(str(entry(rid).ResourceTag), "discovered");
     EXPECT_EQ(entry(rid).ResourceSeverity, SAHPI_MINOR);
+    EXPECT_EQ(ignored.State->Ctrl.StateUnion.Discrete, 4u);
     EXPECT_TRUE(calls.empty());
     EXPECT_TRUE(loggedAt(log, KVI_LOG_DBG_L_NUM, "resource tag was not saved. cannot restore"));
     EXPECT_FALSE(log.contains("kviCsNonVolatileGet failed"));
 }
 
-TEST_F(DaemonRestoreTest, AnIgnoredControlKeepsItsState)
-{
-    Record ignored = control(SAHPI_TRUE);
-    ignored.State->Ctrl.StateUnion.Discrete = 4;
-    SaHpiResourceIdT rid = addResource({&ignored});
-    changedControl(rid, 1, SAHPI_TRUE, 8);
-    ASSERT_EQ(kviCsParmControlDeamonRestore(DOM, rid), SA_OK);
-    EXPECT_EQ(ignored.State->Ctrl.StateUnion.Discrete, 4u);
-    EXPECT_TRUE(calls.empty());
-}
-
-// Within a resource the first failure stops it; the domain walk goes on.
+// Every active resource gets the daemon's copy back; within a resource the
+// first failure stops it, and the domain walk goes on.
 TEST_F(DaemonRestoreTest, AFailingResourceDoesNotStopTheOthers)
 {
-    Record failing = sensor(), later = sensor();
+    Record failing = sensor(), later = sensor(), c = control();
     failing.State->SetResult = SA_ERR_HPI_BUSY;
+    c.State->SetResult = SA_ERR_HPI_BUSY;
     SaHpiResourceIdT bad = addResource({&failing, &later});
     SaHpiResourceIdT good = addResource({}, "before");
+    SaHpiResourceIdT withControl = addResource({&c});
     changedSensor(bad, 1, SAHPI_TRUE, 10, 0x1);
     changedSensor(bad, 2, SAHPI_TRUE, 20, 0x2);
-    changedThroughTheApi(good, SAHPI_TRUE, "after", SAHPI_OK);
-
+    changed(good, SAHPI_TRUE, "after", SAHPI_OK);
+    changedControl(withControl, 1, SAHPI_TRUE, 5);
     KviLogCapture log;
     ASSERT_EQ(kviCsDaemonRestoreDomain(DOM), SA_OK);
     EXPECT_EQ(str(entry(good).ResourceTag), "after");
+    EXPECT_EQ(entry(good).ResourceSeverity, SAHPI_OK);
+    EXPECT_EQ(failing.State->CapabilitiesSeen, 0u) << "the thresholds failed first";
     EXPECT_EQ(later.State->Thresholds.UpMajor.Raw, 0u);
-    EXPECT_TRUE(log.contains("kviCsDeamonRestoreSensorThresh Failed. rc " +
-                             std::to_string(SA_ERR_HPI_ERROR)));
     EXPECT_TRUE(
-        log.contains("kviIsParmControlDeamonRestore returned " + std::to_string(SA_ERR_HPI_ERROR)));
+        loggedAt(log, KVI_LOG_DBG_L_NUM,
+                 "Calling kviIsParmControlDeamonRestore Dom 0, ResId " + std::to_string(good)));
+    EXPECT_EQ(log.matching("kviIsParmControlDeamonRestore returned -1001").size(), 2u);
+    EXPECT_TRUE(log.contains("kviCsDeamonRestoreSensorThresh Failed. rc -1001"));
+    EXPECT_TRUE(log.contains("kviCsDeamonRestoreCtrlState Failed. rc -1001"));
 
-    // A failing event-enable set and a failing control set are reported too.
-    failing.State->SetResult = SA_OK;
+    // A failing event-enable set is reported too.
     later.State->SetResult = SA_ERR_HPI_BUSY;
-    later.Rdr.RdrTypeUnion.SensorRec.ThresholdDefn.IsThreshold = SAHPI_FALSE;
     EXPECT_EQ(kviCsDeamonRestoreEventEnables(DOM, bad, 2, &later.Rdr, &later.Table, later.State),
               SA_ERR_HPI_ERROR);
-    Record c = control();
-    c.State->SetResult = SA_ERR_HPI_BUSY;
-    SaHpiResourceIdT withControl = addResource({&c});
-    changedControl(withControl, 1, SAHPI_TRUE, 5);
-    EXPECT_EQ(kviCsParmControlDeamonRestore(DOM, withControl), SA_ERR_HPI_ERROR);
-    EXPECT_TRUE(
-        log.contains("kviCsDeamonRestoreCtrlState Failed. rc " + std::to_string(SA_ERR_HPI_ERROR)));
+    EXPECT_EQ(later.State->CapabilitiesSeen, entry(bad).ResourceCapabilities);
 }
 
-TEST_F(DaemonRestoreTest, ADamagedSavedValueFailsItsResource)
-{
-    SaHpiResourceIdT rid = addResource({}, "discovered");
-    KviLogCapture log;
-    SaHpiTextBufferT tag = text("long enough");
-    ASSERT_EQ(kviCsNonVolatilePut(rptKey(KVI_NVKEY_RESOURCE_TAG_PREFIX, 1, rid).c_str(), 12, &tag),
-              SA_OK);
-    EXPECT_EQ(kviCsParmControlDeamonRestore(DOM, rid), SA_ERR_HPI_ERROR);
-    EXPECT_TRUE(loggedAt(log, KVI_LOG_ERR_FATAL_NUM, "bytesRead did not match TextBuffer size."));
-    EXPECT_TRUE(log.contains("kviCsDeamonRestoreResourceTag failed. rc=" +
-                             std::to_string(SA_ERR_HPI_ERROR)));
-    EXPECT_EQ(str(entry(rid).ResourceTag), "discovered");
-
-    ASSERT_EQ(kviCsNonVolatileDelete(rptKey(KVI_NVKEY_RESOURCE_TAG_PREFIX, 1, rid).c_str()), SA_OK);
-    ASSERT_EQ(
-        kviCsNonVolatilePut(rptKey(KVI_NVKEY_RESOURCE_SEVERITY_PREFIX, 1, rid).c_str(), 1, "x"),
-        SA_OK);
-    EXPECT_EQ(kviCsParmControlDeamonRestore(DOM, rid), SA_ERR_HPI_ERROR);
-    EXPECT_TRUE(log.contains("kviCsDeamonRestoreResourceSeverity failed. rc=" +
-                             std::to_string(SA_ERR_HPI_ERROR)));
-}
-
-TEST_F(DaemonRestoreTest, ADomainWithoutActiveResourcesIsAnError)
+// A damaged saved value fails its resource; a domain without active
+// resources is an error; null records and tables are refused.
+TEST_F(DaemonRestoreTest, DamagedValuesEmptyDomainsAndNullArgumentsAreErrors)
 {
     KviLogCapture log;
     EXPECT_EQ(kviCsDaemonRestoreDomain(DOM), SA_ERR_HPI_ERROR);
-    EXPECT_TRUE(
-        log.contains("kviCsRptActiveEntryGet returned " + std::to_string(SA_ERR_HPI_NOT_PRESENT)));
-}
+    EXPECT_TRUE(log.contains("kviCsRptActiveEntryGet returned -1013"));
 
-TEST_F(DaemonRestoreTest, RecordRestoresRefuseNullRecordsAndTables)
-{
+    SaHpiResourceIdT rid = addResource({}, "discovered");
+    SaHpiTextBufferT tag = text("long enough");
+    const std::string tagKey = nvKey(KVI_NVKEY_RESOURCE_TAG_PREFIX, 1, rid);
+    ASSERT_EQ(kviCsNonVolatilePut(tagKey.c_str(), 12, &tag), SA_OK);
+    EXPECT_EQ(kviCsParmControlDeamonRestore(DOM, rid), SA_ERR_HPI_ERROR);
+    EXPECT_TRUE(loggedAt(log, KVI_LOG_ERR_FATAL_NUM, "bytesRead did not match TextBuffer size."));
+    EXPECT_TRUE(log.contains("kviCsDeamonRestoreResourceTag failed. rc=-1001"));
+    EXPECT_EQ(str(entry(rid).ResourceTag), "discovered");
+    ASSERT_EQ(kviCsNonVolatileDelete(tagKey.c_str()), SA_OK);
+    ASSERT_EQ(
+        kviCsNonVolatilePut(nvKey(KVI_NVKEY_RESOURCE_SEVERITY_PREFIX, 1, rid).c_str(), 1, "x"),
+        SA_OK);
+    EXPECT_EQ(kviCsParmControlDeamonRestore(DOM, rid), SA_ERR_HPI_ERROR);
+    EXPECT_TRUE(log.contains("kviCsDeamonRestoreResourceSeverity failed. rc=-1001"));
+
     Record s = sensor();
-    for (SaErrorT rc : {
-             kviCsDeamonRestoreSensorThresh(DOM, 1, 1, nullptr, &s.Table, s.State),
-             kviCsDeamonRestoreSensorThresh(DOM, 1, 1, &s.Rdr, nullptr, s.State),
-             kviCsDeamonRestoreEventEnables(DOM, 1, 1, nullptr, &s.Table, s.State),
-             kviCsDeamonRestoreEventEnables(DOM, 1, 1, &s.Rdr, nullptr, s.State),
-             kviCsDeamonRestoreCtrlState(DOM, 1, 1, nullptr, &s.Table, s.State),
-             kviCsDeamonRestoreCtrlState(DOM, 1, 1, &s.Rdr, nullptr, s.State),
-         })
+    for (SaErrorT rc : {kviCsDeamonRestoreSensorThresh(DOM, 1, 1, nullptr, &s.Table, s.State),
+                        kviCsDeamonRestoreEventEnables(DOM, 1, 1, &s.Rdr, nullptr, s.State),
+                        kviCsDeamonRestoreCtrlState(DOM, 1, 1, nullptr, &s.Table, s.State)})
         EXPECT_EQ(rc, SA_ERR_HPI_INVALID_PARAMS);
 }
 
