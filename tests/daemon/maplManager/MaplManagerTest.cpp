@@ -16,23 +16,29 @@ namespace
 {
 
 constexpr const char *LIMITS = "max_mapl_count = \"3\"\nmax_mapl_rwlocks_count = \"2\"\n";
-
-std::string pathOf(std::string_view Name)
-{
-    return kviTestMaplPath(Name);
-}
+const std::string goodA = kviTestMaplPath("KviTestMaplGoodA");
 
 // ---- From a fresh process ----
 
-// Runs in the child: the configuration, then the manager, then the checks
-// of Check; the exit status tells which step failed.
-template <typename Check> int freshManager(const std::string &Config, Check check)
+// Runs Check in a child with the configuration Lines (after a plug-in list
+// of GoodA) and a fresh manager; the child's exit status must be Status, and
+// a step that fails before Check exits with 10 or 11. AllocationToFail, when
+// not 0, is counted from the manager's initialization.
+template <typename Check>
+void inFreshManager(const std::string &Lines, int Status, Check check,
+                    SaHpiInt32T AllocationToFail = 0, const std::string &Modules = goodA)
 {
-    if (kviCsConfigInit(SAHPI_FALSE, Config.c_str()) != SA_OK)
-        return 10;
-    if (kviDsMaplManagerInitialize() != SA_OK)
-        return 11;
-    return check();
+    KviTempDir dir;
+    const std::string config = dir.write("kvi.conf", kviTestMaplConfig(Modules, Lines));
+    auto child = [&] {
+        if (kviCsConfigInit(SAHPI_FALSE, config.c_str()) != SA_OK)
+            return 10;
+        kviCsMemoryFailNthAllocation(AllocationToFail);
+        if (kviDsMaplManagerInitialize() != SA_OK)
+            return 11;
+        return check();
+    };
+    EXPECT_EXIT(exit(child()), testing::ExitedWithCode(Status), "");
 }
 
 TEST(MaplManagerDeathTest, EveryOperationIsRefusedBeforeInitialize)
@@ -40,16 +46,12 @@ TEST(MaplManagerDeathTest, EveryOperationIsRefusedBeforeInitialize)
     KviLogCapture log(KVI_LOG_WARN_NUM);
     auto child = [] {
         KviCsRwLockT *lock = nullptr;
-        const SaErrorT results[] = {
-            kviDsMaplManagerLoadMapls(),
-            kviDsMaplManagerUnloadAllMapls(),
-            kviDsMaplManagerDiscoverResources(SAHPI_DEFAULT_DOMAIN_ID),
-            kviDsMaplManagerGetMaplLock(0, 0, &lock),
-            kviDsMaplManagerUnprotectedGetMaplLock(0, 0, &lock),
-            kviDsMaplManagerGetMaplMasterLock(&lock),
-            kviDsMaplManagerUnloadMapl(0),
-        };
-        for (SaErrorT rc : results)
+        for (SaErrorT rc :
+             {kviDsMaplManagerLoadMapls(), kviDsMaplManagerUnloadAllMapls(),
+              kviDsMaplManagerDiscoverResources(SAHPI_DEFAULT_DOMAIN_ID),
+              kviDsMaplManagerGetMaplLock(0, 0, &lock),
+              kviDsMaplManagerUnprotectedGetMaplLock(0, 0, &lock),
+              kviDsMaplManagerGetMaplMasterLock(&lock), kviDsMaplManagerUnloadMapl(0)})
             if (rc != SA_ERR_HPI_UNINITIALIZED)
                 return 1;
         return kviDsMaplManagerFinalize() == SA_ERR_HPI_INVALID_REQUEST ? 0 : 2;
@@ -60,17 +62,17 @@ TEST(MaplManagerDeathTest, EveryOperationIsRefusedBeforeInitialize)
                                 "kviDsMaplManagerFinalize called when not initalized"));
 }
 
+// A limit that is not a positive number falls back to ten, with a word why;
+// a number is read as far as it goes.
 TEST(MaplManagerDeathTest, LimitsComeFromTheConfigurationWithTenAsTheFallback)
 {
-    struct Case {
+    const struct {
         const char *lines;
-        SaHpiUint32T slots;
-        SaHpiUint32T locks;
+        SaHpiUint32T slots, locks;
         std::vector<std::string> messages;
-    };
-    const Case cases[] = {
+    } cases[] = {
         {"", 10, 10, {}},
-        {"max_mapl_count = \"3\"\nmax_mapl_rwlocks_count = \"2\"\n", 3, 2, {}},
+        {LIMITS, 3, 2, {}},
         {"max_mapl_count = \"0\"\nmax_mapl_rwlocks_count = \"0\"\n",
          10,
          10,
@@ -81,37 +83,27 @@ TEST(MaplManagerDeathTest, LimitsComeFromTheConfigurationWithTenAsTheFallback)
          10,
          {"Invalid value many for max_mapl_count in config file.",
           "Invalid value 0x4 for max_mapl_rwlocks_count in config file."}},
-        // Read as a number as far as it goes.
         {"max_mapl_count = \"12abc\"\n", 12, 10, {}},
         {"max_mapl_count = \"123456789012345678901234567890\"\n",
          10,
          10,
          {"Unexpected return code of -1008 when recovering max_mapl_count"}},
     };
-    for (const Case &c : cases) {
+    for (const auto &c : cases) {
         SCOPED_TRACE(c.lines);
-        KviTempDir dir;
-        const std::string config =
-            dir.write("kvi.conf", kviTestMaplConfig(pathOf("KviTestMaplGoodA"), c.lines));
         KviLogCapture log(KVI_LOG_DBG_H_NUM);
-        auto check = [&c] {
+        inFreshManager(c.lines, 0, [&c] {
             SaHpiInt8T name[8];
             KviCsRwLockT *lock = nullptr;
-            if (kviDsMaplManagerLoadMapls() != SA_OK)
-                return 1;
-            if (kviDsMaplManagerGetMaplName(c.slots - 1, sizeof name, name) !=
-                SA_ERR_HPI_NOT_PRESENT)
-                return 2;
-            if (kviDsMaplManagerGetMaplName(c.slots, sizeof name, name) != SA_ERR_HPI_INVALID)
-                return 3;
-            if (kviDsMaplManagerUnprotectedGetMaplLock(0, c.locks - 1, &lock) != SA_OK)
-                return 4;
-            return kviDsMaplManagerUnprotectedGetMaplLock(0, c.locks, &lock) ==
+            return kviDsMaplManagerLoadMapls() != SA_OK                                          ? 1
+                   : kviDsMaplManagerGetMaplName(c.slots - 1, 8, name) != SA_ERR_HPI_NOT_PRESENT ? 2
+                   : kviDsMaplManagerGetMaplName(c.slots, 8, name) != SA_ERR_HPI_INVALID         ? 3
+                   : kviDsMaplManagerUnprotectedGetMaplLock(0, c.locks - 1, &lock) != SA_OK      ? 4
+                   : kviDsMaplManagerUnprotectedGetMaplLock(0, c.locks, &lock) !=
                            SA_ERR_HPI_NOT_PRESENT
-                       ? 0
-                       : 5;
-        };
-        EXPECT_EXIT(exit(freshManager(config, check)), testing::ExitedWithCode(0), "");
+                       ? 5
+                       : 0;
+        });
         EXPECT_TRUE(log.contains("Max MAPLS supported: " + std::to_string(c.slots)));
         for (const std::string &message : c.messages)
             EXPECT_TRUE(log.contains(message)) << message;
@@ -124,78 +116,52 @@ TEST(MaplManagerDeathTest, LimitsComeFromTheConfigurationWithTenAsTheFallback)
 
 TEST(MaplManagerDeathTest, MorePluginsListedThanSlotsEndsTheProcess)
 {
-    KviTempDir dir;
-    const std::string config = dir.write(
-        "kvi.conf", kviTestMaplConfig(kviTestMaplList({"KviTestMaplGoodA", "KviTestMaplGoodB"}),
-                                      "max_mapl_count = \"1\"\n"));
     KviLogCapture log(KVI_LOG_INFO_NUM);
-    EXPECT_EXIT(exit(freshManager(config, [] { return 20 + kviDsMaplManagerLoadMapls(); })),
-                testing::ExitedWithCode(1), "");
+    inFreshManager(
+        "max_mapl_count = \"1\"\n", 1, [] { return 20 + kviDsMaplManagerLoadMapls(); }, 0,
+        kviTestMaplList({"KviTestMaplGoodA", "KviTestMaplGoodB"}));
     EXPECT_TRUE(kviTestLoggedAt(log, KVI_LOG_ERR_FATAL_NUM,
                                 "Unable to add MAPL.  Max of 1 is already present"));
     EXPECT_TRUE(log.contains("TestMapl KviTestMaplGoodA initialized in slot 0"));
     EXPECT_FALSE(log.contains("TestMapl KviTestMaplGoodB initialized"));
 }
 
+// Finalize drops the configuration callback, once; the table stays.
 TEST(MaplManagerDeathTest, FinalizeStopsFollowingTheConfigurationButKeepsThePlugins)
 {
-    KviTempDir dir;
-    const std::string config =
-        dir.write("kvi.conf", kviTestMaplConfig(pathOf("KviTestMaplGoodA"), LIMITS));
     KviLogCapture log(KVI_LOG_INFO_NUM);
-    auto check = [] {
+    inFreshManager(LIMITS, 0, [] {
         const KviCsCfgCallback callback = kviDsMaplManagerConfigFileCallback;
-        if (kviCsConfigRegister(callback, nullptr) != SA_ERR_HPI_DUPLICATE)
-            return 1;
-        if (kviDsMaplManagerLoadMapls() != SA_OK || kviDsMaplManagerFinalize() != SA_OK)
-            return 2;
-        if (kviCsConfigUnregister(callback, nullptr) != SA_ERR_HPI_NOT_PRESENT)
-            return 3;
-        if (kviTestMaplNameIn(0) != pathOf("KviTestMaplGoodA"))
-            return 4;
-        // Only the callback was dropped, and only once; the table stays.
-        if (kviDsMaplManagerFinalize() != SA_OK)
-            return 5;
-        return kviDsMaplManagerInitialize() == SA_ERR_HPI_DUPLICATE ? 0 : 6;
-    };
-    EXPECT_EXIT(exit(freshManager(config, check)), testing::ExitedWithCode(0), "");
+        return kviCsConfigRegister(callback, nullptr) != SA_ERR_HPI_DUPLICATE                ? 1
+               : kviDsMaplManagerLoadMapls() != SA_OK || kviDsMaplManagerFinalize() != SA_OK ? 2
+               : kviCsConfigUnregister(callback, nullptr) != SA_ERR_HPI_NOT_PRESENT          ? 3
+               : kviTestMaplNameIn(0) != goodA                                               ? 4
+               : kviDsMaplManagerFinalize() != SA_OK                                         ? 5
+               : kviDsMaplManagerInitialize() != SA_ERR_HPI_DUPLICATE                        ? 6
+                                                                                             : 0;
+    });
     EXPECT_TRUE(log.contains("Unegistration of callback failed!"));
     EXPECT_TRUE(log.contains("Function called more than once-- bad"));
 }
 
+// The first allocation of initialization is the slot table; the names and
+// the lock pool follow. A limit of -1 asks for more than can be allocated.
 TEST(MaplManagerDeathTest, TablesThatCannotBeAllocatedEndTheProcess)
 {
-    KviTempDir dir;
-    const struct {
-        const char *lines;
-        SaHpiInt32T failAllocation; // counted from the manager's initialization
-        const char *fatalLine;
-    } cases[] = {
+    const std::tuple<const char *, SaHpiInt32T, const char *> cases[] = {
         {LIMITS, 1, "Unable to allocate memory for MaplList"},
-        // No upper bound: -1 asks for more slots than can be allocated.
         {"max_mapl_count = \"-1\"\n", 0, "Unable to allocate memory for MaplList"},
         {LIMITS, 2, "Unable to allocate memory for the name of Mapl"},
         {LIMITS, 3, "Unable to allocate memory for 2 Mapl locks"},
         {"max_mapl_rwlocks_count = \"-1\"\n", 0,
          "Unable to allocate memory for 4294967295 Mapl locks"},
     };
-    for (const auto &c : cases) {
-        SCOPED_TRACE(c.fatalLine);
-        const std::string config =
-            dir.write("kvi.conf", kviTestMaplConfig(pathOf("KviTestMaplGoodA"), c.lines));
+    for (auto [lines, failing, fatalLine] : cases) {
+        SCOPED_TRACE(fatalLine);
         KviLogCapture log(KVI_LOG_ERR_FATAL_NUM);
-        auto child = [&] {
-            if (kviCsConfigInit(SAHPI_FALSE, config.c_str()) != SA_OK)
-                return 10;
-            // The first allocation of initialization is the slot table; the
-            // registration of the callback and of a plug-in follow.
-            kviCsMemoryFailNthAllocation(c.failAllocation);
-            if (kviDsMaplManagerInitialize() != SA_OK)
-                return 11;
-            return 20 + kviDsMaplManagerLoadMapls();
-        };
-        EXPECT_EXIT(exit(child()), testing::ExitedWithCode(1), "");
-        EXPECT_TRUE(kviTestLoggedAt(log, KVI_LOG_ERR_FATAL_NUM, c.fatalLine));
+        inFreshManager(
+            lines, 1, [] { return 20 + kviDsMaplManagerLoadMapls(); }, failing);
+        EXPECT_TRUE(kviTestLoggedAt(log, KVI_LOG_ERR_FATAL_NUM, fatalLine));
     }
 }
 
@@ -220,9 +186,9 @@ class MaplManagerTest : public testing::Test
 
     // Lists the plug-ins in the configuration file, loads it afresh and runs
     // the manager's configuration callback, as a change of the file would.
-    static void listMapls(const std::string &Modules, std::string_view More = LIMITS)
+    static void listMapls(const std::string &Modules)
     {
-        writeConfig(kviTestMaplConfig(Modules, More));
+        writeConfig(kviTestMaplConfig(Modules, LIMITS));
         kviDsMaplManagerConfigFileCallback();
     }
 
@@ -236,14 +202,13 @@ class MaplManagerTest : public testing::Test
     static SaHpiResourceIdT discoveredBy(std::string_view Name)
     {
         EXPECT_EQ(kviDsMaplManagerDiscoverResources(SAHPI_DEFAULT_DOMAIN_ID), SA_OK);
-        return KviLoadedMapl(pathOf(Name)).resource();
+        return KviLoadedMapl(kviTestMaplPath(Name)).resource();
     }
 
     static bool inRpt(SaHpiResourceIdT Rid)
     {
         SaHpiBoolT active = SAHPI_FALSE;
-        return kviCsRptEntryGetByRid(SAHPI_DEFAULT_DOMAIN_ID, Rid, nullptr, &active, nullptr) ==
-               SA_OK;
+        return kviCsRptEntryGetByRid(0, Rid, nullptr, &active, nullptr) == SA_OK;
     }
 
     static inline KviTempDir *configDir = nullptr;
@@ -254,28 +219,26 @@ TEST_F(MaplManagerTest, ListedPluginsTakeTheLowestSlotsInListOrderAndANameListed
     KviLogCapture log(KVI_LOG_INFO_NUM);
     listMapls(kviTestMaplList({"KviTestMaplGoodA", "KviTestMaplGoodB", "KviTestMaplGoodA"}));
     EXPECT_EQ(kviDsMaplManagerLoadMapls(), SA_OK); // nothing left to do
-    EXPECT_EQ(kviTestMaplNameIn(0), pathOf("KviTestMaplGoodA"));
-    EXPECT_EQ(kviTestMaplNameIn(1), pathOf("KviTestMaplGoodB"));
+    EXPECT_EQ(kviTestMaplNameIn(0), goodA);
+    EXPECT_EQ(kviTestMaplNameIn(1), kviTestMaplPath("KviTestMaplGoodB"));
     EXPECT_EQ(kviTestMaplNameIn(2), "");
-    EXPECT_EQ(KviLoadedMapl(pathOf("KviTestMaplGoodB")).slot(), 1u);
+    EXPECT_EQ(KviLoadedMapl(kviTestMaplPath("KviTestMaplGoodB")).slot(), 1u);
     EXPECT_EQ(log.matching("TestMapl KviTestMaplGoodA initialized in slot 0").size(), 1u);
     EXPECT_EQ(log.matching("initialized in slot").size(), 2u);
 }
 
+// Missing files and directories, libraries that are no plug-ins and plug-ins
+// with a broken table are refused, each with its message, and left closed.
 TEST_F(MaplManagerTest, EveryBadPluginIsRefusedWithItsMessageAndTheGoodOnesStillLoad)
 {
     KviTempDir notALibrary;
-    struct Case {
-        std::string file;
-        std::string message;
-    };
     auto plugin = [](const char *Name, const char *Format) {
-        const std::string path = pathOf(Name);
+        const std::string path = kviTestMaplPath(Name);
         char text[4096];
         snprintf(text, sizeof text, Format, path.c_str());
-        return Case{path, text};
+        return std::pair<std::string, std::string>{path, text};
     };
-    const Case cases[] = {
+    const std::pair<std::string, std::string> cases[] = {
         {"/nonexistent/libKviNothing.so",
          "dlopen failed to open /nonexistent/libKviNothing.so.  Returned "},
         {notALibrary.path(), "dlopen failed to open " + notALibrary.path() + ".  Returned "},
@@ -297,77 +260,70 @@ TEST_F(MaplManagerTest, EveryBadPluginIsRefusedWithItsMessageAndTheGoodOnesStill
                "KviModuleInitTable.ResourcesDiscover is NULL in %s."),
         plugin("KviTestMaplNullInitFini", "moduleInitTable.MaplInitialization is NULL in %s."),
     };
-    for (const Case &c : cases) {
-        SCOPED_TRACE(c.file);
+    for (const auto &[file, message] : cases) {
+        SCOPED_TRACE(file);
         KviLogCapture log(KVI_LOG_ERR_NONFATAL_NUM);
-        listMapls(c.file + ";" + pathOf("KviTestMaplGoodA"));
-        EXPECT_TRUE(kviTestLoggedAt(log, KVI_LOG_ERR_NONFATAL_NUM, c.message));
-        EXPECT_TRUE(log.contains("Can't add MAPL " + c.file));
+        listMapls(file + ";" + goodA);
+        EXPECT_TRUE(kviTestLoggedAt(log, KVI_LOG_ERR_NONFATAL_NUM, message));
+        EXPECT_TRUE(log.contains("Can't add MAPL " + file));
         EXPECT_EQ(kviDsMaplManagerLoadMapls(), SA_OK);
-        EXPECT_EQ(kviTestMaplNameIn(0), pathOf("KviTestMaplGoodA"));
+        EXPECT_EQ(kviTestMaplNameIn(0), goodA);
         EXPECT_EQ(kviTestMaplNameIn(1), "");
-        if (c.file.find("/plugins/") != std::string::npos) {
-            EXPECT_FALSE(KviLoadedMapl(c.file).loaded()) << "refused plug-in left open";
+        if (file.find("/plugins/") != std::string::npos) {
+            EXPECT_FALSE(KviLoadedMapl(file).loaded()) << "refused plug-in left open";
         }
         EXPECT_EQ(kviDsMaplManagerUnloadAllMapls(), SA_OK);
     }
 }
 
+// A plug-in whose start fails is closed but keeps its slot, neither retried
+// nor called, until it is no longer listed; a direct load reports the code.
 TEST_F(MaplManagerTest, PluginWhoseStartFailsKeepsItsSlotUntilItIsNoLongerListed)
 {
-    const std::string failing = pathOf("KviTestMaplInitFails");
+    const std::string failing = kviTestMaplPath("KviTestMaplInitFails");
     KviLogCapture log(KVI_LOG_INFO_NUM);
-    listMapls(failing + ";" + pathOf("KviTestMaplGoodA"));
+    listMapls(failing + ";" + goodA);
     EXPECT_TRUE(log.contains("MaplInitialization failed in Mapl " + failing + ".  rc=-1019"));
     EXPECT_TRUE(
         log.contains("kviDsMaplManagerRegisterMapl failed for module " + failing + ".  rc=-1019"));
     EXPECT_FALSE(KviLoadedMapl(failing).loaded());
     EXPECT_EQ(kviTestMaplNameIn(0), failing);
-    EXPECT_EQ(kviTestMaplNameIn(1), pathOf("KviTestMaplGoodA"));
-
-    // Still listed: neither retried nor called again.
+    EXPECT_EQ(kviTestMaplNameIn(1), goodA);
     EXPECT_EQ(kviDsMaplManagerLoadMapls(), SA_OK);
     EXPECT_EQ(kviDsMaplManagerDiscoverResources(SAHPI_DEFAULT_DOMAIN_ID), SA_OK);
     EXPECT_EQ(log.matching("TestMapl KviTestMaplInitFails initialized").size(), 1u);
     EXPECT_TRUE(log.contains("Unable to call discover-- Null FnPtr for Mapl[0]"));
-
-    listMapls(pathOf("KviTestMaplGoodA"));
+    listMapls(goodA);
     EXPECT_EQ(kviTestMaplNameIn(0), "");
     EXPECT_TRUE(log.contains("Unloading Mapl " + failing));
     EXPECT_FALSE(log.contains("TestMapl KviTestMaplInitFails finalized"));
+
+    EXPECT_EQ(kviDsMaplManagerLoadMapl(failing.c_str()), SA_ERR_HPI_INITIALIZING);
+    EXPECT_EQ(kviDsMaplManagerLoadMapl(kviTestMaplPath("KviTestMaplVersion100").c_str()),
+              SA_ERR_HPI_ERROR);
 }
 
-TEST_F(MaplManagerTest, LoadMaplReturnsTheCodeOfAFailedStart)
+// Discovery runs every plug-in and goes on after a failure. A plug-in no
+// longer listed loses its resources first, while it can still free what it
+// attached, then is finalized and closed; its slot goes to the next new one.
+// Load, discover and unload give back every block.
+TEST_F(MaplManagerTest, UnlistedPluginLosesItsResourcesIsFinalizedAndClosedAndItsSlotIsReused)
 {
-    EXPECT_EQ(kviDsMaplManagerLoadMapl(pathOf("KviTestMaplInitFails").c_str()),
-              SA_ERR_HPI_INITIALIZING);
-    EXPECT_EQ(kviDsMaplManagerLoadMapl(pathOf("KviTestMaplVersion100").c_str()), SA_ERR_HPI_ERROR);
-    EXPECT_EQ(kviDsMaplManagerLoadMapl(pathOf("KviTestMaplGoodB").c_str()), SA_OK);
-    EXPECT_EQ(kviTestMaplNameIn(1), pathOf("KviTestMaplGoodB"));
-}
-
-TEST_F(MaplManagerTest, DiscoveryRunsEveryPluginAndGoesOnAfterAFailure)
-{
+    const std::string both = kviTestMaplList({"KviTestMaplDiscoverFails", "KviTestMaplGoodA"});
+    listMapls(both);
+    ASSERT_EQ(kviDsMaplManagerUnloadAllMapls(), SA_OK);
+    const SaHpiInt32T baseline = kviTestLiveBlocks();
     KviLogCapture log(KVI_LOG_INFO_NUM);
-    listMapls(kviTestMaplList({"KviTestMaplDiscoverFails", "KviTestMaplGoodA"}));
+    ASSERT_EQ(kviDsMaplManagerLoadMapls(), SA_OK);
     const SaHpiResourceIdT rid = discoveredBy("KviTestMaplGoodA");
     EXPECT_TRUE(log.contains("TestMapl KviTestMaplDiscoverFails fails discovery"));
     EXPECT_TRUE(log.contains("Mapl[0] Discover returned -1020"));
-    EXPECT_NE(rid, 0u);
-    EXPECT_TRUE(inRpt(rid));
-}
-
-TEST_F(MaplManagerTest, UnlistedPluginLosesItsResourcesIsFinalizedAndClosedAndItsSlotIsReused)
-{
-    listMapls(kviTestMaplList({"KviTestMaplGoodA", "KviTestMaplGoodB"}));
-    const SaHpiResourceIdT rid = discoveredBy("KviTestMaplGoodA");
     ASSERT_TRUE(inRpt(rid));
-    KviLogCapture log(KVI_LOG_INFO_NUM);
-    listMapls(pathOf("KviTestMaplGoodB"));
+    log.clear();
+    listMapls(kviTestMaplPath("KviTestMaplDiscoverFails"));
     EXPECT_FALSE(inRpt(rid));
     EXPECT_FALSE(kviTestMaplLoaded("KviTestMaplGoodA"));
-    EXPECT_EQ(kviTestMaplNameIn(0), "");
-    // Resources first, while the plug-in can still free what it attached.
+    EXPECT_EQ(kviTestMaplNameIn(1), "");
     const std::vector<std::string> lines = log.lines();
     auto at = [&lines](const std::string &Text) {
         for (size_t i = 0; i < lines.size(); i++)
@@ -375,32 +331,24 @@ TEST_F(MaplManagerTest, UnlistedPluginLosesItsResourcesIsFinalizedAndClosedAndIt
                 return i;
         return lines.size();
     };
-    const size_t removed = at("TestMapl KviTestMaplGoodA removed rid=" + std::to_string(rid));
-    const size_t finalized = at("TestMapl KviTestMaplGoodA finalized");
-    const size_t unloading = at("Unloading Mapl " + pathOf("KviTestMaplGoodA"));
-    EXPECT_LT(removed, finalized);
-    EXPECT_LT(finalized, unloading);
-    EXPECT_LT(unloading, lines.size());
+    EXPECT_LT(at("TestMapl KviTestMaplGoodA removed rid=" + std::to_string(rid)),
+              at("TestMapl KviTestMaplGoodA finalized"));
+    EXPECT_LT(at("TestMapl KviTestMaplGoodA finalized"), at("Unloading Mapl " + goodA));
+    EXPECT_LT(at("Unloading Mapl " + goodA), lines.size());
 
-    listMapls(kviTestMaplList({"KviTestMaplGoodB", "KviTestMaplSlow"}));
-    EXPECT_EQ(kviTestMaplNameIn(0), pathOf("KviTestMaplSlow"));
-}
-
-TEST_F(MaplManagerTest, LoadDiscoverUnloadGivesBackEveryBlock)
-{
-    listMapls(kviTestMaplList({"KviTestMaplGoodA", "KviTestMaplGoodB"}));
-    ASSERT_EQ(kviDsMaplManagerUnloadAllMapls(), SA_OK);
-    const SaHpiInt32T baseline = kviTestLiveBlocks();
-    ASSERT_EQ(kviDsMaplManagerLoadMapls(), SA_OK);
-    ASSERT_EQ(kviDsMaplManagerDiscoverResources(SAHPI_DEFAULT_DOMAIN_ID), SA_OK);
-    EXPECT_GT(kviTestLiveBlocks(), baseline);
+    listMapls(kviTestMaplList({"KviTestMaplDiscoverFails", "KviTestMaplSlow"}));
+    EXPECT_EQ(kviTestMaplNameIn(1), kviTestMaplPath("KviTestMaplSlow"));
+    listMapls(both);
     ASSERT_EQ(kviDsMaplManagerUnloadAllMapls(), SA_OK);
     EXPECT_EQ(kviTestLiveBlocks(), baseline);
 }
 
-TEST_F(MaplManagerTest, GetMaplLockWantsTheMasterLockHeldForReading)
+// The lock of a plug-in is handed out under the master lock held for
+// reading (its unprotected twin needs none); names need room for the
+// terminator.
+TEST_F(MaplManagerTest, LocksAndNamesAreHandedOutOnlyAsTheContractSays)
 {
-    listMapls(pathOf("KviTestMaplGoodA"));
+    listMapls(goodA);
     KviLogCapture log(KVI_LOG_ERR_NONFATAL_NUM);
     KviCsRwLockT *master = nullptr;
     ASSERT_EQ(kviDsMaplManagerGetMaplMasterLock(&master), SA_OK);
@@ -409,106 +357,81 @@ TEST_F(MaplManagerTest, GetMaplLockWantsTheMasterLockHeldForReading)
     EXPECT_TRUE(log.contains("The caller to kviDsMaplManagerGetMaplLock did not perform a read "
                              "lock on the MaplMasterLock"));
     EXPECT_EQ(lock, nullptr);
-
     ASSERT_EQ(KVI_CS_RW_LOCK_RD_LOCK(master, 1000), SA_OK);
     EXPECT_EQ(kviDsMaplManagerGetMaplLock(0, 1, &lock), SA_OK);
     KviCsRwLockT *same = nullptr;
     EXPECT_EQ(kviDsMaplManagerUnprotectedGetMaplLock(0, 1, &same), SA_OK);
     EXPECT_EQ(lock, same);
-    const struct {
-        SaHpiUint32T mapl, lock;
-        const char *message;
-    } refused[] = {
-        {0, 2, "Lock 2 out of range"},
-        {1, 0, "Mapl 1 not in use"},
-        {3, 0, "Mapl 3 out of range"},
-    };
-    for (const auto &r : refused) {
-        EXPECT_EQ(kviDsMaplManagerGetMaplLock(r.mapl, r.lock, &lock), SA_ERR_HPI_NOT_PRESENT);
-        EXPECT_EQ(kviDsMaplManagerUnprotectedGetMaplLock(r.mapl, r.lock, &lock),
+    const std::tuple<SaHpiUint32T, SaHpiUint32T, const char *> refused[] = {
+        {0, 2, "Lock 2 out of range"}, {1, 0, "Mapl 1 not in use"}, {3, 0, "Mapl 3 out of range"}};
+    for (auto [mapl, index, message] : refused) {
+        EXPECT_EQ(kviDsMaplManagerGetMaplLock(mapl, index, &lock), SA_ERR_HPI_NOT_PRESENT);
+        EXPECT_EQ(kviDsMaplManagerUnprotectedGetMaplLock(mapl, index, &lock),
                   SA_ERR_HPI_NOT_PRESENT);
-        EXPECT_EQ(log.matching(r.message).size(), 2u) << r.message;
+        EXPECT_EQ(log.matching(message).size(), 2u) << message;
     }
-    EXPECT_EQ(kviDsMaplManagerGetMaplLock(0, 0, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("MaplLock pointer is NULL."));
     EXPECT_EQ(KVI_CS_RW_LOCK_RD_UNLOCK(master), SA_OK);
     // The refused check gave the master lock back.
     EXPECT_EQ(KVI_CS_RW_LOCK_TRY_WR_LOCK(master), SA_OK);
     EXPECT_EQ(KVI_CS_RW_LOCK_WR_UNLOCK(master), SA_OK);
-}
 
-TEST_F(MaplManagerTest, GetMaplNameNeedsRoomForTheTerminator)
-{
-    const std::string path = pathOf("KviTestMaplGoodA");
-    listMapls(path);
-    std::vector<SaHpiInt8T> buffer(path.size() + 1, 'x');
-    EXPECT_EQ(kviDsMaplManagerGetMaplName(0, path.size(), buffer.data()),
+    std::vector<SaHpiInt8T> buffer(goodA.size() + 1, 'x');
+    EXPECT_EQ(kviDsMaplManagerGetMaplName(0, goodA.size(), buffer.data()),
               SA_ERR_HPI_DATA_EX_LIMITS);
-    EXPECT_EQ(kviDsMaplManagerGetMaplName(0, path.size() + 1, buffer.data()), SA_OK);
-    EXPECT_EQ(std::string(reinterpret_cast<const char *>(buffer.data())), path);
+    EXPECT_EQ(kviDsMaplManagerGetMaplName(0, goodA.size() + 1, buffer.data()), SA_OK);
+    EXPECT_EQ(std::string(reinterpret_cast<const char *>(buffer.data())), goodA);
     EXPECT_EQ(kviDsMaplManagerGetMaplName(1, buffer.size(), buffer.data()), SA_ERR_HPI_NOT_PRESENT);
     EXPECT_EQ(kviDsMaplManagerGetMaplName(3, buffer.size(), buffer.data()), SA_ERR_HPI_INVALID);
-    KviLogCapture log(KVI_LOG_ERR_NONFATAL_NUM);
-    EXPECT_EQ(kviDsMaplManagerGetMaplName(0, 10, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("Buffer pointer is NULL."));
 }
 
-TEST_F(MaplManagerTest, InternalStepsRefuseWhatTheyCannotDo)
+TEST_F(MaplManagerTest, NullArgumentsAndSlotsOutOfRangeOrUnusedAreRefused)
 {
     KviLogCapture log(KVI_LOG_ERR_NONFATAL_NUM);
     KviMaplInitTableT table{};
     int handle = 0;
-    EXPECT_EQ(kviDsMaplManagerRegisterMapl(nullptr, nullptr, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviDsMaplManagerRegisterMapl("x", nullptr, &table), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_EQ(kviDsMaplManagerRegisterMapl("x", &handle, nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    const std::vector<std::string> nulls = {"FileName pointer is NULL.",
-                                            "LibraryHandle pointer is NULL.",
-                                            "ModuleInitTable pointer is NULL."};
-    for (const std::string &message : nulls)
-        EXPECT_EQ(log.matching(message).size(), 1u) << message;
+    const std::pair<SaErrorT, const char *> cases[] = {
+        {kviDsMaplManagerRegisterMapl(nullptr, &handle, &table), "FileName pointer is NULL."},
+        {kviDsMaplManagerRegisterMapl("x", nullptr, &table), "LibraryHandle pointer is NULL."},
+        {kviDsMaplManagerRegisterMapl("x", &handle, nullptr), "ModuleInitTable pointer is NULL."},
+        {kviDsMaplManagerGetMaplLock(0, 0, nullptr), "MaplLock pointer is NULL."},
+        {kviDsMaplManagerGetMaplMasterLock(nullptr), "MaplMasterLock pointer is NULL."},
+        {kviDsMaplManagerGetMaplName(0, 10, nullptr), "Buffer pointer is NULL."},
+    };
+    for (auto [rc, line] : cases) {
+        EXPECT_EQ(rc, SA_ERR_HPI_INVALID_PARAMS) << line;
+        EXPECT_EQ(log.matching(line).size(), 1u) << line;
+    }
     EXPECT_EQ(kviDsMaplManagerUnloadMapl(3), SA_ERR_HPI_ERROR);
     EXPECT_TRUE(log.contains("Invalid Mapl value 3 passed in.  Bad."));
     EXPECT_EQ(kviDsMaplManagerUnloadMapl(2), SA_ERR_HPI_ERROR);
     EXPECT_TRUE(log.contains("Request to remove Mapl 2, but Mapl not in use!"));
 }
 
-TEST_F(MaplManagerTest, ModuleListThatCannotBeReadLeavesTheLoadedSetAlone)
+// A module list that cannot be read, or a master lock that stays taken,
+// leaves the loaded set as it was.
+TEST_F(MaplManagerTest, ModuleListThatCannotBeReadOrALockedTableLeavesTheLoadedSetAlone)
 {
-    listMapls(pathOf("KviTestMaplGoodA"));
-    KviLogCapture log(KVI_LOG_ERR_NONFATAL_NUM);
-    const struct {
-        std::string config;
-        SaErrorT rc;
-        const char *message;
-    } cases[] = {
+    listMapls(goodA);
+    KviLogCapture log(KVI_LOG_WARN_NUM);
+    const std::tuple<std::string, SaErrorT, const char *> cases[] = {
         {LIMITS, SA_ERR_HPI_NOT_PRESENT, "Config file doesn't have mapl_modules specified."},
         {kviTestMaplConfig(std::string(2048, 'm'), LIMITS), SA_ERR_HPI_DATA_TRUNCATED,
          "Can't get module list from config file-- too long."},
     };
-    for (const auto &c : cases) {
-        SCOPED_TRACE(c.message);
-        writeConfig(c.config);
-        EXPECT_EQ(kviDsMaplManagerLoadMapls(), c.rc);
-        EXPECT_TRUE(kviTestLoggedAt(log, KVI_LOG_ERR_NONFATAL_NUM, c.message));
-        EXPECT_EQ(kviTestMaplNameIn(0), pathOf("KviTestMaplGoodA"));
+    for (const auto &[config, rc, message] : cases) {
+        SCOPED_TRACE(message);
+        writeConfig(config);
+        EXPECT_EQ(kviDsMaplManagerLoadMapls(), rc);
+        EXPECT_TRUE(kviTestLoggedAt(log, KVI_LOG_ERR_NONFATAL_NUM, message));
+        EXPECT_EQ(kviTestMaplNameIn(0), goodA);
     }
-}
-
-TEST_F(MaplManagerTest, LoadGivesUpWhenTheMasterLockStaysTaken)
-{
-    listMapls(pathOf("KviTestMaplGoodA"));
+    listMapls(goodA);
     KviCsRwLockT *master = nullptr;
     ASSERT_EQ(kviDsMaplManagerGetMaplMasterLock(&master), SA_OK);
     ASSERT_EQ(KVI_CS_RW_LOCK_RD_LOCK(master, 1000), SA_OK);
-    KviLogCapture log(KVI_LOG_WARN_NUM);
     EXPECT_EQ(kviDsMaplManagerLoadMapls(), SA_ERR_HPI_BUSY);
     EXPECT_TRUE(kviTestLoggedAt(log, KVI_LOG_WARN_NUM, "Unable to acquire MaplMasterLock"));
     EXPECT_EQ(KVI_CS_RW_LOCK_RD_UNLOCK(master), SA_OK);
-    KviCsRwLockT *out = nullptr;
-    EXPECT_EQ(kviDsMaplManagerGetMaplMasterLock(&out), SA_OK);
-    EXPECT_EQ(out, master);
-    EXPECT_EQ(kviDsMaplManagerGetMaplMasterLock(nullptr), SA_ERR_HPI_INVALID_PARAMS);
-    EXPECT_TRUE(log.contains("MaplMasterLock pointer is NULL."));
 }
 
 } // namespace
