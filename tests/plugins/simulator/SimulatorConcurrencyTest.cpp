@@ -20,48 +20,49 @@ namespace
 
 enum class Outcome { Done, Gone, Busy };
 
-// The frame of a redirected call: the entry is looked up under the master
-// lock, the plug-in's lock is taken before the master lock is let go, and the
-// slot runs under the plug-in's lock alone. Gone: the entry left the table.
-template <typename Call> Outcome frame(SaHpiResourceIdT Rid, SaHpiEntryIdT RecordId, Call call)
-{
-    KviCsRwLockT *master = nullptr;
-    if (kviDsMaplManagerGetMaplMasterLock(&master) != SA_OK ||
-        KVI_CS_RW_LOCK_RD_LOCK(master, 1000) != SA_OK)
-        return Outcome::Busy;
-    SaHpiRptEntryT entry{};
-    KviDsRptFnTable rptFn{};
-    void *user = nullptr;
-    SaHpiUint32T maplNum = 0;
-    KviCsRwLockT *lock = nullptr;
-    SaErrorT rc = kviCsRptActiveEntryGetByRid(DOMAIN, Rid, &entry, &rptFn, &user, &maplNum, &lock);
-    SaHpiRdrT rdr{};
-    KviDsRdrFnTable rdrFn{};
-    void *data = nullptr;
-    if (rc == SA_OK && RecordId != SAHPI_FIRST_ENTRY) {
-        SaHpiBoolT active = SAHPI_FALSE;
-        rc = kviCsRdrGet(DOMAIN, Rid, SAHPI_NO_RECORD, RecordId, nullptr, &rdr, &active, &data,
-                         &rdrFn, nullptr, nullptr);
-    }
-    if (rc != SA_OK) {
-        KVI_CS_DOA_RW_LOCK_RD_UNLOCK(master);
-        return Outcome::Gone;
-    }
-    if (KVI_CS_RW_LOCK_RD_LOCK(lock, 1000) != SA_OK) {
-        KVI_CS_DOA_RW_LOCK_RD_UNLOCK(master);
-        return Outcome::Busy;
-    }
-    KVI_CS_DOA_RW_LOCK_RD_UNLOCK(master);
-    call(entry, rptFn, user, rdr, rdrFn, data);
-    KVI_CS_DOA_RW_LOCK_RD_UNLOCK(lock);
-    return Outcome::Done;
-}
-
 struct Target {
     SaHpiResourceIdT Rid;
     SaHpiEntryIdT RecordId; // SAHPI_FIRST_ENTRY: the resource itself
     SaHpiRdrTypeT Type;
 };
+
+// What the frame found for a target.
+struct Found {
+    KviDsRptFnTable Rpt;
+    void *User;
+    SaHpiRdrT Rdr;
+    KviDsRdrFnTable Fn;
+    void *Data;
+};
+
+// The frame of a redirected call: the entry is looked up under the master
+// lock, the plug-in's lock is taken before the master lock is let go, and the
+// slot runs under the plug-in's lock alone. Gone: the entry left the table.
+template <typename Call> Outcome frame(const Target &T, Call call)
+{
+    KviCsRwLockT *master = nullptr;
+    if (kviDsMaplManagerGetMaplMasterLock(&master) != SA_OK ||
+        KVI_CS_RW_LOCK_RD_LOCK(master, 1000) != SA_OK)
+        return Outcome::Busy;
+    Found f{};
+    SaHpiUint32T maplNum = 0;
+    KviCsRwLockT *lock = nullptr;
+    SaHpiBoolT active = SAHPI_FALSE;
+    SaErrorT rc =
+        kviCsRptActiveEntryGetByRid(DOMAIN, T.Rid, nullptr, &f.Rpt, &f.User, &maplNum, &lock);
+    if (rc == SA_OK && T.RecordId != SAHPI_FIRST_ENTRY)
+        rc = kviCsRdrGet(DOMAIN, T.Rid, SAHPI_NO_RECORD, T.RecordId, nullptr, &f.Rdr, &active,
+                         &f.Data, &f.Fn, nullptr, nullptr);
+    Outcome outcome = rc != SA_OK                                   ? Outcome::Gone
+                      : KVI_CS_RW_LOCK_RD_LOCK(lock, 1000) != SA_OK ? Outcome::Busy
+                                                                    : Outcome::Done;
+    KVI_CS_DOA_RW_LOCK_RD_UNLOCK(master);
+    if (outcome == Outcome::Done) {
+        call(f);
+        KVI_CS_DOA_RW_LOCK_RD_UNLOCK(lock);
+    }
+    return outcome;
+}
 
 // One client: random calls until told to stop. Every result must be one the
 // simulator gives for such a call.
@@ -69,97 +70,83 @@ void client(const std::vector<Target> &Targets, unsigned Seed, const std::atomic
             std::atomic<int> &Calls, std::atomic<int> &Failures)
 {
     std::mt19937 random(Seed);
-    auto expect = [&](bool Ok) {
-        if (!Ok)
-            Failures++;
-    };
+    auto expect = [&](bool Ok) { Failures += Ok ? 0 : 1; };
     while (!Stop) {
         const Target &t = Targets[random() % Targets.size()];
-        auto call = [&](SaHpiRptEntryT &, KviDsRptFnTable &Rpt, void *User, SaHpiRdrT &Rdr,
-                        KviDsRdrFnTable &Fn, void *Data) {
-            const SaHpiDomainIdT d = DOMAIN;
-            const SaHpiResourceIdT r = t.Rid;
+        const SaHpiDomainIdT d = DOMAIN;
+        const SaHpiResourceIdT r = t.Rid;
+        Outcome outcome = frame(t, [&](Found &F) {
             switch (t.Type) {
             case SAHPI_SENSOR_RDR: {
-                SaHpiSensorNumT n = Rdr.RdrTypeUnion.SensorRec.Num;
                 SaHpiSensorReadingT reading{};
-                expect(Fn.SensorReadingGet(d, r, n, 0, &Rdr, Data, &reading) == SA_OK);
+                expect(F.Fn.SensorReadingGet(d, r, 0, 0, &F.Rdr, F.Data, &reading) == SA_OK);
                 SaHpiSensorThresholdsT limits{};
-                if (Fn.SensorThresholdsGet(d, r, n, &Rdr, Data, &limits) == SA_OK)
-                    expect(Fn.SensorThresholdsSet(d, r, n, &Rdr, &limits, Data) == SA_OK);
+                if (F.Fn.SensorThresholdsGet(d, r, 0, &F.Rdr, F.Data, &limits) == SA_OK)
+                    expect(F.Fn.SensorThresholdsSet(d, r, 0, &F.Rdr, &limits, F.Data) == SA_OK);
                 SaHpiEventT event{};
-                SaErrorT rc = Fn.ActiveAlarmTranslate(d, r, n, Data, &Rdr, nullptr, &event);
+                SaErrorT rc = F.Fn.ActiveAlarmTranslate(d, r, 0, F.Data, &F.Rdr, nullptr, &event);
                 expect(rc == SA_OK || rc == SA_ERR_HPI_NOT_PRESENT);
                 break;
             }
             case SAHPI_CTRL_RDR: {
-                SaHpiCtrlNumT n = Rdr.RdrTypeUnion.CtrlRec.Num;
                 SaHpiCtrlStateT state{};
-                state.Type = Rdr.RdrTypeUnion.CtrlRec.Type;
+                state.Type = F.Rdr.RdrTypeUnion.CtrlRec.Type;
                 state.StateUnion.Text.Line = SAHPI_TLN_ALL_LINES;
-                expect(Fn.ControlStateGet(d, r, n, Data, &state) == SA_OK);
-                expect(Fn.ControlStateSet(d, r, n, &state, Data) == SA_OK);
+                expect(F.Fn.ControlStateGet(d, r, 0, F.Data, &state) == SA_OK);
+                expect(F.Fn.ControlStateSet(d, r, 0, &state, F.Data) == SA_OK);
                 break;
             }
             case SAHPI_INVENTORY_RDR: {
                 std::vector<uint64_t> buffer(1024);
                 SaHpiUint32T actual = 0;
-                expect(Fn.EntityInventoryDataRead(
-                           d, r, 0, 8192, Data,
-                           reinterpret_cast<SaHpiInventoryDataT *>(buffer.data()),
-                           &actual) == SA_OK);
+                auto *data = reinterpret_cast<SaHpiInventoryDataT *>(buffer.data());
+                expect(F.Fn.EntityInventoryDataRead(d, r, 0, 8192, F.Data, data, &actual) == SA_OK);
                 break;
             }
             case SAHPI_WATCHDOG_RDR: {
-                SaHpiWatchdogNumT n = Rdr.RdrTypeUnion.WatchdogRec.WatchdogNum;
                 SaHpiWatchdogT w{};
-                w.Log = SAHPI_TRUE;
-                w.Running = SAHPI_TRUE;
+                w.Log = w.Running = SAHPI_TRUE;
                 w.TimerUse = SAHPI_WTU_SMS_OS;
                 w.TimerAction = SAHPI_WA_RESET;
                 w.InitialCount = 5 + random() % 20;
-                expect(Fn.WatchdogTimerSet(d, r, n, &w, Data) == SA_OK);
-                expect(Fn.WatchdogTimerReset(d, r, n, Data) == SA_OK);
-                expect(Fn.WatchdogTimerGet(d, r, n, Data, &w) == SA_OK);
+                expect(F.Fn.WatchdogTimerSet(d, r, 0, &w, F.Data) == SA_OK);
+                expect(F.Fn.WatchdogTimerReset(d, r, 0, F.Data) == SA_OK);
+                expect(F.Fn.WatchdogTimerGet(d, r, 0, F.Data, &w) == SA_OK);
                 break;
             }
             default: {
                 SaHpiSelEntryT entry{};
                 entry.Event.EventType = SAHPI_ET_USER;
                 entry.Event.Severity = SAHPI_INFORMATIONAL;
-                expect(Rpt.EventLogEntryAdd(d, r, &entry, User) == SA_OK);
-                SaHpiSelEntryIdT id = SAHPI_OLDEST_ENTRY;
+                expect(F.Rpt.EventLogEntryAdd(d, r, &entry, F.User) == SA_OK);
+                SaHpiSelEntryIdT prev = 0, id = SAHPI_OLDEST_ENTRY;
                 while (id != SAHPI_NO_MORE_ENTRIES) {
-                    SaHpiSelEntryIdT prev = 0;
-                    SaErrorT rc =
-                        Rpt.EventLogEntryGet(d, r, id, User, &prev, &id, &entry, nullptr, nullptr);
+                    SaErrorT rc = F.Rpt.EventLogEntryGet(d, r, id, F.User, &prev, &id, &entry,
+                                                         nullptr, nullptr);
                     // Entries come and go under the walk.
                     expect(rc == SA_OK || rc == SA_ERR_HPI_NOT_PRESENT);
                     if (rc != SA_OK)
                         break;
                 }
-                expect(Rpt.ResourcePowerStateSet(d, r, SAHPI_HS_POWER_CYCLE, User) == SA_OK);
+                expect(F.Rpt.ResourcePowerStateSet(d, r, SAHPI_HS_POWER_CYCLE, F.User) == SA_OK);
                 if (random() % 8 == 0)
-                    expect(Rpt.EventLogClear(d, r, User) == SA_OK);
+                    expect(F.Rpt.EventLogClear(d, r, F.User) == SA_OK);
                 break;
             }
             }
-        };
-        Outcome outcome = frame(t.Rid, t.RecordId, call);
+        });
         expect(outcome != Outcome::Gone);
-        if (outcome == Outcome::Done)
-            Calls++;
+        Calls += outcome == Outcome::Done ? 1 : 0;
     }
 }
 
 TEST(SimulatorConcurrencyTest, ClientsRaceTheCountdownThreadAndUnloadingStopsIt)
 {
     KviTempDir dir;
-    const std::string config = dir.write("sim.conf", "mapl_modules = \"" + simulatorPath() +
-                                                         "\"\n"
-                                                         "max_mapl_rwlocks_count = \"4\"\n"
-                                                         "KviSimProcessorBoards = \"6\"\n"
-                                                         "KviSimEventLogSize = \"8\"\n");
+    const std::string config =
+        dir.write("sim.conf", "mapl_modules = \"" + simulatorPath() +
+                                  "\"\nmax_mapl_rwlocks_count = \"4\"\n"
+                                  "KviSimProcessorBoards = \"6\"\nKviSimEventLogSize = \"8\"\n");
     ASSERT_EQ(kviCsConfigInit(SAHPI_FALSE, config.c_str()), SA_OK);
     ASSERT_EQ(kviCsDomainInitialize(), SA_OK);
     ASSERT_EQ(kviCsRdrInitialize(), SA_OK);
@@ -196,25 +183,19 @@ TEST(SimulatorConcurrencyTest, ClientsRaceTheCountdownThreadAndUnloadingStopsIt)
     int running = 0;
     for (const Target &t : targets)
         if (t.Type == SAHPI_WATCHDOG_RDR)
-            frame(t.Rid, t.RecordId,
-                  [&](SaHpiRptEntryT &, KviDsRptFnTable &, void *, SaHpiRdrT &Rdr,
-                      KviDsRdrFnTable &Fn, void *Data) {
-                      SaHpiWatchdogNumT n = Rdr.RdrTypeUnion.WatchdogRec.WatchdogNum;
-                      SaHpiWatchdogT w{};
-                      w.Running = SAHPI_TRUE;
-                      w.TimerUse = SAHPI_WTU_SMS_OS;
-                      w.TimerAction = SAHPI_WA_POWER_CYCLE;
-                      w.InitialCount = 5 * ++running;
-                      Fn.WatchdogTimerSet(DOMAIN, t.Rid, n, &w, Data);
-                      Fn.WatchdogTimerReset(DOMAIN, t.Rid, n, Data);
-                  });
+            frame(t, [&](Found &F) {
+                SaHpiWatchdogT w{};
+                w.Running = SAHPI_TRUE;
+                w.TimerUse = SAHPI_WTU_SMS_OS;
+                w.TimerAction = SAHPI_WA_POWER_CYCLE;
+                w.InitialCount = 5 * ++running;
+                F.Fn.WatchdogTimerSet(DOMAIN, t.Rid, 0, &w, F.Data);
+                F.Fn.WatchdogTimerReset(DOMAIN, t.Rid, 0, F.Data);
+            });
     ASSERT_EQ(running, 6);
     EXPECT_EQ(kviDsMaplManagerUnloadAllMapls(), SA_OK);
     for (const Target &t : targets)
-        EXPECT_EQ(frame(t.Rid, t.RecordId,
-                        [](SaHpiRptEntryT &, KviDsRptFnTable &, void *, SaHpiRdrT &,
-                           KviDsRdrFnTable &, void *) {}),
-                  Outcome::Gone);
+        EXPECT_EQ(frame(t, [](Found &) {}), Outcome::Gone);
     SaHpiEntryIdT next = 0;
     SaHpiRptEntryT entry{};
     EXPECT_EQ(kviCsRptActiveEntryGet(DOMAIN, SAHPI_FIRST_ENTRY, &next, &entry, nullptr),

@@ -11,7 +11,6 @@
 #include <vector>
 
 #include "KviDaemonCore.h"
-#include "kvi/KviMaplManager.h"
 
 namespace
 {
@@ -25,28 +24,6 @@ inline std::string simulatorPath()
     return std::string(dir != nullptr ? dir : ".") + "/../plugins/libKviSimulator.so";
 #endif
 }
-
-// The test program links the library statically; the plug-in resolves its
-// library symbols against the program, so every one it uses must be linked
-// in even where the test itself does not call it.
-[[maybe_unused]] volatile const void *const PluginImports[] = {
-    reinterpret_cast<const void *>(&kviCsCfgDataUint32Get),
-    reinterpret_cast<const void *>(&kviCsDefaultEirSet),
-    reinterpret_cast<const void *>(&kviCsDefaultWatchdogSet),
-    reinterpret_cast<const void *>(&kviCsRdrAdd),
-    reinterpret_cast<const void *>(&kviCsRdrGetSensor),
-    reinterpret_cast<const void *>(&kviCsRdrGetWatchdog),
-    reinterpret_cast<const void *>(&kviCsRptEntryActiveStateSetByRid),
-    reinterpret_cast<const void *>(&kviCsRptEntryAdd),
-    reinterpret_cast<const void *>(&kviCsRptEntryGetByRid),
-    reinterpret_cast<const void *>(&kviCsRptEntryModifyByRid),
-    reinterpret_cast<const void *>(&kviCsRptEntryRemoveByRid),
-    reinterpret_cast<const void *>(&kviDsMaplManagerGetMaplLock),
-    reinterpret_cast<const void *>(&kviCsGetSaHpiTime),
-    reinterpret_cast<const void *>(&kviCsMalloc),
-    reinterpret_cast<const void *>(&kviCsFree),
-    reinterpret_cast<const void *>(&kviCsLogger),
-};
 
 constexpr SaHpiDomainIdT DOMAIN = SAHPI_DEFAULT_DOMAIN_ID;
 constexpr SaHpiUint32T LOCKS = 3;
@@ -91,9 +68,8 @@ struct Shelf {
 inline Shelf walkShelf()
 {
     Shelf shelf;
-    SaHpiEntryIdT entry = SAHPI_FIRST_ENTRY;
-    while (entry != SAHPI_LAST_ENTRY) {
-        SaHpiEntryIdT next = 0;
+    for (SaHpiEntryIdT entry = SAHPI_FIRST_ENTRY, next = 0; entry != SAHPI_LAST_ENTRY;
+         entry = next) {
         Resource r{};
         void *user = nullptr;
         if (kviCsRptActiveEntryGet(DOMAIN, entry, &next, &r.Entry, &user) != SA_OK) {
@@ -105,23 +81,19 @@ inline Shelf walkShelf()
                                               &r.MaplNum, &r.Lock),
                   SA_OK);
         EXPECT_EQ(user, r.UserDefined);
-        SaHpiEntryIdT rdrEntry = SAHPI_FIRST_ENTRY;
-        while (rdrEntry != SAHPI_LAST_ENTRY) {
+        for (SaHpiEntryIdT at = SAHPI_FIRST_ENTRY, after = 0; at != SAHPI_LAST_ENTRY; at = after) {
             Record rec{};
             SaHpiBoolT active = SAHPI_FALSE;
-            SaHpiEntryIdT rdrNext = 0;
-            if (kviCsRdrGet(DOMAIN, rid, SAHPI_NO_RECORD, rdrEntry, &rdrNext, &rec.Rdr, &active,
+            if (kviCsRdrGet(DOMAIN, rid, SAHPI_NO_RECORD, at, &after, &rec.Rdr, &active,
                             &rec.UserData, &rec.Fn, nullptr, nullptr) != SA_OK) {
-                ADD_FAILURE() << "RDR walk of rid " << rid << " stopped at " << rdrEntry;
+                ADD_FAILURE() << "RDR walk of rid " << rid << " stopped at " << at;
                 break;
             }
             EXPECT_TRUE(active);
             r.Records.push_back(rec);
-            rdrEntry = rdrNext;
         }
         shelf.Order.push_back(rid);
         shelf.ByTag[textOf(r.Entry.ResourceTag)] = r;
-        entry = next;
     }
     return shelf;
 }
