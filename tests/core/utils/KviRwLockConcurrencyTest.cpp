@@ -140,3 +140,27 @@ TEST_F(KviRwLockConcurrencyTest, WritersExcludeEveryoneUnderLoad)
         EXPECT_EQ(s->Value, 1);
 }
 } // namespace
+
+namespace
+{
+// A plug-in being unloaded takes each of its locks for writing and then
+// destroys and frees it, while the last reader may still be leaving. The
+// reader must not touch the lock once the writer can have it.
+TEST(KviRwLockLifetime, WriterMayFreeTheLockAsSoonAsItHasIt)
+{
+    for (int round = 0; round < 50; ++round) {
+        auto *lock = new KviCsRwLockT{};
+        ASSERT_EQ(KVI_CS_RW_LOCK_INIT(lock), SA_OK);
+        ASSERT_EQ(KVI_CS_RW_LOCK_RD_LOCK(lock, 1000), SA_OK);
+        std::thread writer([lock] {
+            ASSERT_EQ(KVI_CS_RW_LOCK_WR_LOCK(lock, 5000), SA_OK);
+            ASSERT_EQ(KVI_CS_RW_LOCK_WR_UNLOCK(lock), SA_OK);
+            ASSERT_EQ(KVI_CS_RW_LOCK_DESTROY(lock), SA_OK);
+            delete lock;
+        });
+        std::this_thread::sleep_for(std::chrono::microseconds(200 + 37 * round));
+        ASSERT_EQ(KVI_CS_RW_LOCK_RD_UNLOCK(lock), SA_OK);
+        writer.join();
+    }
+}
+} // namespace
