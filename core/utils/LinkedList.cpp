@@ -72,6 +72,34 @@ SaErrorT removeEnd(KviCsLinkedListNodeT *node, KviFunctionTrace &trace, bool hea
     detach(node);
     return SA_OK;
 }
+// Adds at the head or the tail. Emptiness is judged by the end being added
+// to; a stray pointer at the other end is dropped with a warning.
+SaErrorT addAtEnd(KviCsLinkedListT *list, KviCsLinkedListNodeT *node, bool head)
+{
+    if (list == nullptr || node == nullptr) {
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL,
+                 list == nullptr ? "Parameter LinkedList == NULL" : "Parameter NodeToAdd == NULL");
+        return SA_ERR_HPI_INVALID_PARAMS;
+    }
+    KviCsLinkedListNodeT *&near = head ? list->HeadPointer : list->TailPointer;
+    KviCsLinkedListNodeT *far = head ? list->TailPointer : list->HeadPointer;
+    if (near == nullptr) {
+        if (far != nullptr)
+            KVI_ELOG(KVI_LOG_ERR_NONFATAL,
+                     head ? "Head Pointer is NULL, but Tail Pointer isn't. Recovering by "
+                            "resetting tail to NULL"
+                          : "TailPointer is NULL, but HeadPointer isn't. Recovering by setting "
+                            "HeadPointer to NULL");
+        makeOnlyElement(list, node);
+        return SA_OK;
+    }
+    node->LinkedList = list;
+    (head ? node->Previous : node->Next) = nullptr;
+    (head ? node->Next : node->Previous) = near;
+    (head ? near->Previous : near->Next) = node;
+    near = node;
+    return SA_OK;
+}
 } // namespace
 
 extern "C" {
@@ -114,48 +142,14 @@ KVI_EXPORT SaErrorT kviCsLinkedListAddToHead(KviCsLinkedListT *LinkedList,
                                              KviCsLinkedListNodeT *NodeToAdd) noexcept
 {
     KVI_TRACE("");
-    if (LinkedList == nullptr || NodeToAdd == nullptr) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, LinkedList == nullptr ? "Parameter LinkedList == NULL"
-                                                             : "Parameter NodeToAdd == NULL");
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    if (LinkedList->HeadPointer == nullptr) {
-        if (LinkedList->TailPointer != nullptr)
-            KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Head Pointer is NULL, but Tail Pointer isn't. "
-                                           "Recovering by resetting tail to NULL");
-        makeOnlyElement(LinkedList, NodeToAdd);
-        return SA_OK;
-    }
-    NodeToAdd->LinkedList = LinkedList;
-    NodeToAdd->Previous = nullptr;
-    NodeToAdd->Next = LinkedList->HeadPointer;
-    LinkedList->HeadPointer->Previous = NodeToAdd;
-    LinkedList->HeadPointer = NodeToAdd;
-    return SA_OK;
+    return addAtEnd(LinkedList, NodeToAdd, true);
 }
 
 KVI_EXPORT SaErrorT kviCsLinkedListAddToTail(KviCsLinkedListT *LinkedList,
                                              KviCsLinkedListNodeT *NodeToAdd) noexcept
 {
     KVI_TRACE("");
-    if (LinkedList == nullptr || NodeToAdd == nullptr) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, LinkedList == nullptr ? "Parameter LinkedList == NULL"
-                                                             : "Parameter NodeToAdd == NULL");
-        return SA_ERR_HPI_INVALID_PARAMS;
-    }
-    if (LinkedList->TailPointer == nullptr) {
-        if (LinkedList->HeadPointer != nullptr)
-            KVI_ELOG(KVI_LOG_ERR_NONFATAL, "TailPointer is NULL, but HeadPointer isn't. "
-                                           "Recovering by setting HeadPointer to NULL");
-        makeOnlyElement(LinkedList, NodeToAdd);
-        return SA_OK;
-    }
-    NodeToAdd->LinkedList = LinkedList;
-    NodeToAdd->Next = nullptr;
-    NodeToAdd->Previous = LinkedList->TailPointer;
-    LinkedList->TailPointer->Next = NodeToAdd;
-    LinkedList->TailPointer = NodeToAdd;
-    return SA_OK;
+    return addAtEnd(LinkedList, NodeToAdd, false);
 }
 
 KVI_EXPORT SaErrorT kviCsLinkedListRemoveNode(KviCsLinkedListNodeT *NodeToRemove) noexcept
