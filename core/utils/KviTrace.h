@@ -5,6 +5,8 @@
 
 #include <cstdarg>
 #include <cstdlib>
+#include <cstring>
+#include <type_traits>
 
 #include "kvi/KviLogging.h"
 #include "kvi/KviRwLock.h"
@@ -21,7 +23,7 @@ class KviFunctionTrace
   public:
     KviFunctionTrace(const char *file, int line, const char *func, SaHpiUint32T level,
                      const char *format, ...) noexcept __attribute__((format(printf, 6, 7)))
-        : file_(file), func_(func), line_(line)
+    : file_(file), func_(func), line_(line)
     {
         va_list args;
         va_start(args, format);
@@ -43,12 +45,12 @@ class KviFunctionTrace
 };
 
 // Refuses a null pointer argument before any lock is taken.
-#define KVI_NULL_CHECK(Ptr)                                                                       \
-    do {                                                                                          \
-        if ((Ptr) == nullptr) {                                                                   \
-            KVI_ELOG(KVI_LOG_ERR_NONFATAL, #Ptr " pointer is NULL.");                             \
-            return SA_ERR_HPI_INVALID_PARAMS;                                                     \
-        }                                                                                         \
+#define KVI_NULL_CHECK(Ptr)                                                                        \
+    do {                                                                                           \
+        if ((Ptr) == nullptr) {                                                                    \
+            KVI_ELOG(KVI_LOG_ERR_NONFATAL, #Ptr " pointer is NULL.");                              \
+            return SA_ERR_HPI_INVALID_PARAMS;                                                      \
+        }                                                                                          \
     } while (0)
 
 // Where a guard was made, so lock traces and fatal lines name the real caller.
@@ -58,7 +60,11 @@ struct KviCallSite {
     int line;
     const char *text; // the lock argument's source text, for the fatal line
 };
-#define KVI_CALL_SITE(text) KviCallSite{__FILE__, __func__, __LINE__, text}
+#define KVI_CALL_SITE(text)                                                                        \
+    KviCallSite                                                                                    \
+    {                                                                                              \
+        __FILE__, __func__, __LINE__, text                                                         \
+    }
 
 // Ends the process after a release that must not fail did fail.
 [[noreturn]] void kviCsFatalRelease(const KviCallSite &site, const char *what,
@@ -133,8 +139,18 @@ template <bool Write> class KviRwGuard
 using KviReadLock = KviRwGuard<false>;
 using KviWriteLock = KviRwGuard<true>;
 #define KVI_READ_GUARD(var, lock, timeout) KviReadLock var((lock), (timeout), KVI_CALL_SITE(#lock))
-#define KVI_WRITE_GUARD(var, lock, timeout)                                                       \
+#define KVI_WRITE_GUARD(var, lock, timeout)                                                        \
     KviWriteLock var((lock), (timeout), KVI_CALL_SITE(#lock))
 
 // Entry trace of the current function with a printf-style message.
 #define KVI_TRACE(...) KviFunctionTrace trace(KVI_LOG_FUNC_IN, __VA_ARGS__)
+
+// The integer stored in an enumeration that came from outside (a client, a
+// plug-in, a file), read without taking it for one of the enumerators: such
+// values are checked, not trusted.
+template <typename E> std::underlying_type_t<E> kviCsRawEnum(const E &Value) noexcept
+{
+    std::underlying_type_t<E> raw;
+    memcpy(&raw, &Value, sizeof raw);
+    return raw;
+}

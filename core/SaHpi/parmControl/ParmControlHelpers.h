@@ -11,16 +11,6 @@
 #include "KviDaemonCore.h"
 #include "core/utils/KviTrace.h"
 
-// The integer stored in an enumeration that came from outside (a client, a
-// plug-in, a file), read without taking it for one of the enumerators: such
-// values are checked, not trusted.
-template <typename E> std::underlying_type_t<E> kviCsRawEnum(const E &Value) noexcept
-{
-    std::underlying_type_t<E> raw;
-    memcpy(&raw, &Value, sizeof raw);
-    return raw;
-}
-
 // Keys of resource-level and record-level settings: prefix, flag digit,
 // domain id, resource id and, for a record, its 8-bit number, in lower-case
 // hex. The longest ("kviSavFru " form) is 29 characters, the store's limit.
