@@ -444,8 +444,9 @@ SaErrorT getActiveRdr(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, Sa
 namespace
 {
 
-constexpr SaHpiUint32T TEXT_DATA_TYPE_COUNT = SAHPI_TL_TYPE_BINARY + 1;
-constexpr SaHpiUint32T LANGUAGE_COUNT = SAHPI_LANG_ZULU + 1;
+// The four text types and the languages up to SAHPI_LANG_ZULU.
+constexpr SaHpiUint32T TEXT_DATA_TYPE_COUNT = 4;
+constexpr SaHpiUint32T LANGUAGE_COUNT = 137;
 
 SaErrorT validateTextState(const SaHpiCtrlRecTextT &Rec, const SaHpiCtrlStateTextT &State) noexcept
 {
