@@ -25,12 +25,18 @@ class KviFunctionTrace
                      const char *format, ...) noexcept __attribute__((format(printf, 6, 7)))
     : file_(file), func_(func), line_(line)
     {
+        if (!kviCsLogWanted(level))
+            return;
         va_list args;
         va_start(args, format);
         kviCsVLogger(file, static_cast<SaHpiInt16T>(line), func, level, format, args);
         va_end(args);
     }
-    ~KviFunctionTrace() { kviCsLogger(file_, line_, func_, KVI_LOG_FUNC_OUT_NUM, "%s", exit_); }
+    ~KviFunctionTrace()
+    {
+        if (kviCsLogWanted(KVI_LOG_FUNC_OUT_NUM))
+            kviCsLogger(file_, line_, func_, KVI_LOG_FUNC_OUT_NUM, "%s", exit_);
+    }
     KviFunctionTrace(const KviFunctionTrace &) = delete;
     KviFunctionTrace &operator=(const KviFunctionTrace &) = delete;
 

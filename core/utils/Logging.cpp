@@ -18,6 +18,9 @@
 #include "kvi/KviThread.h"
 #include "kvi/KviTime.h"
 
+// Read outside the semaphore by design: the filter runs before any lock.
+std::atomic<KviCsLogLevelSettingT> kviCsCurrentLogLevel{KVI_LOG_DBG_L_NUM};
+
 namespace
 {
 constexpr SaHpiUint32T LOG_FLAGS_MASK = ~static_cast<SaHpiUint32T>(KVI_LOG_NUM_MASK);
@@ -32,7 +35,6 @@ constexpr const char *TRUNCATION_MARKER = "<The following line has been truncate
 std::atomic<FILE *> logFileHandle{nullptr};
 KviCsSemaphore logSem;
 std::atomic<bool> SemIsInitialized{false};
-std::atomic<KviCsLogLevelSettingT> KviCsCurrentLogLevel{KVI_LOG_DBG_L_NUM};
 
 bool validLevelNumber(KviCsLogLevelSettingT level)
 {
@@ -45,16 +47,6 @@ bool validLevelNumber(KviCsLogLevelSettingT level)
 SaHpiUint32T normaliseLevel(SaHpiUint32T level)
 {
     return ((level & KVI_LOG_NUM_MASK) != 0 && (level & LOG_FLAGS_MASK) != 0) ? 0 : level;
-}
-
-bool filteredOut(SaHpiUint32T level)
-{
-    KviCsLogLevelSettingT current = KviCsCurrentLogLevel.load(std::memory_order_relaxed);
-    SaHpiUint32T num = level & KVI_LOG_NUM_MASK;
-    if (num != 0 && num < (current & KVI_LOG_NUM_MASK))
-        return true;
-    SaHpiUint32T flags = level & LOG_FLAGS_MASK;
-    return flags != 0 && (flags & current) == 0;
 }
 
 struct LevelLabel {
@@ -101,7 +93,8 @@ void stampNow(TimeStamp &stamp)
     SaHpiUint32T mseconds = 0;
     if (kviCsGetSecondsAndMillisecondsNoLogging(&seconds, &mseconds) != SA_OK)
         seconds = mseconds = 0;
-    struct tm broken {};
+    struct tm broken {
+    };
     if (kviCsTimeGetGmTimeNoLogging(seconds, &broken) != SA_OK) {
         trio_snprintf(stamp.millis, sizeof stamp.millis, "%s", "MSTIME FAILED (1)");
         return;
@@ -153,9 +146,9 @@ SaErrorT kviCsVLogger(const char *SourceFile, SaHpiInt16T LineNumber, const char
     SaHpiUint32T threadNum = 0;
     if (kviCsThreadNum(&threadNum) != SA_OK)
         threadNum = static_cast<SaHpiUint32T>(-1);
-    SaHpiUint32T level = normaliseLevel(Level);
-    if (filteredOut(level))
+    if (!kviCsLogWanted(Level))
         return SA_OK;
+    SaHpiUint32T level = normaliseLevel(Level);
 
     char message[KVI_CS_MAX_LOG_STRING_LENGTH];
     auto length = static_cast<SaHpiInt16T>(trio_vsnprintf(message, sizeof message, Message, Args));
@@ -166,8 +159,8 @@ SaErrorT kviCsVLogger(const char *SourceFile, SaHpiInt16T LineNumber, const char
 extern "C" {
 
 KVI_EXPORT SaErrorT kviCsLogger(const char *SourceFile, SaHpiInt16T LineNumber,
-                                const char *FunctionName, SaHpiUint32T Level,
-                                const char *Message, ...) noexcept
+                                const char *FunctionName, SaHpiUint32T Level, const char *Message,
+                                ...) noexcept
 {
     va_list args;
     va_start(args, Message);
@@ -186,7 +179,7 @@ KVI_EXPORT SaErrorT kviCsLogInitialize(KviCsLogLevelSettingT LogLevel,
                 static_cast<int>(LogLevel));
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    KviCsCurrentLogLevel.store(LogLevel);
+    kviCsCurrentLogLevel.store(LogLevel);
     if (LogFileName == nullptr) {
         fputs("ERROR: Internal Error #1002, unable to initialize logging. (No filename)\n", stderr);
         return SA_ERR_HPI_INVALID_PARAMS;
@@ -271,7 +264,7 @@ KVI_EXPORT SaErrorT kviCsSetLogLevel(KviCsLogLevelSettingT LogLevel) noexcept
                  static_cast<int>(LogLevel));
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    KviCsCurrentLogLevel.store(LogLevel);
+    kviCsCurrentLogLevel.store(LogLevel);
     return SA_OK;
 }
 
@@ -279,7 +272,7 @@ KVI_EXPORT SaErrorT kviCsSetLogLevel(KviCsLogLevelSettingT LogLevel) noexcept
 
 void kviCsFatalRelease(const KviCallSite &site, const char *what, SaErrorT rc) noexcept
 {
-    kviCsLogger(site.file, static_cast<SaHpiInt16T>(site.line), site.func,
-                KVI_LOG_ERR_FATAL_NUM, "%s on %s returned %d", what, site.text, rc);
+    kviCsLogger(site.file, static_cast<SaHpiInt16T>(site.line), site.func, KVI_LOG_ERR_FATAL_NUM,
+                "%s on %s returned %d", what, site.text, rc);
     exit(1);
 }

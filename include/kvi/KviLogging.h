@@ -78,4 +78,40 @@ KVI_API void kviCsLogInitHelper(const char *LogFileName, const char *LogLevel) K
 
 KVI_EXTERN_C_END
 
+/* Inside the library a line below the level costs one compare: the level is
+ * tested where the line is written, before any call or formatting. */
+#if defined(__cplusplus) && defined(KVI_INLINE_LOG_FILTER)
+#include <atomic>
+extern std::atomic<KviCsLogLevelSettingT> kviCsCurrentLogLevel;
+/* A level that mixes a threshold with category flags is never filtered. */
+inline bool kviCsLogWanted(SaHpiUint32T Level) noexcept
+{
+    const SaHpiUint32T num = Level & KVI_LOG_NUM_MASK;
+    const SaHpiUint32T flags = Level & ~static_cast<SaHpiUint32T>(KVI_LOG_NUM_MASK);
+    if (num != 0 && flags != 0)
+        return true;
+    const KviCsLogLevelSettingT current = kviCsCurrentLogLevel.load(std::memory_order_relaxed);
+    if (num != 0 && num < (current & KVI_LOG_NUM_MASK))
+        return false;
+    return flags == 0 || (flags & current) != 0;
+}
+#define KVI_LOG_FILTERED_(File, Line, Func, Level, ...)                                            \
+    (kviCsLogWanted(Level) ? kviCsLogger(File, Line, Func, Level, __VA_ARGS__) : SA_OK)
+#define KVI_LOG_INLINE_(...) KVI_LOG_FILTERED_(__VA_ARGS__)
+#undef KVI_ELOG
+#undef KVI_WLOG
+#undef KVI_ILOG
+#undef KVI_DLOG
+#undef KVI_FLOG
+#undef KVI_MLOG
+#undef KVI_SLOG
+#define KVI_ELOG(...) KVI_LOG_INLINE_(__VA_ARGS__)
+#define KVI_WLOG(...) KVI_LOG_INLINE_(__VA_ARGS__)
+#define KVI_ILOG(...) KVI_LOG_INLINE_(__VA_ARGS__)
+#define KVI_DLOG(...) KVI_LOG_INLINE_(__VA_ARGS__)
+#define KVI_FLOG(...) KVI_LOG_INLINE_(__VA_ARGS__)
+#define KVI_MLOG(...) KVI_LOG_INLINE_(__VA_ARGS__)
+#define KVI_SLOG(...) KVI_LOG_INLINE_(__VA_ARGS__)
+#endif
+
 #endif
