@@ -347,13 +347,12 @@ SaErrorT resumeAt(SaHpiSessionIdT SessionId, SaHpiUint32T Number) noexcept
                  Number);
         return SA_OK;
     }
+    // Slot 0 is written last in the ring's first round, so an empty slot
+    // does not end the search.
     KviCsEventT *found = nullptr;
     for (SaHpiInt32T i = 0; i < RingEntries && found == nullptr; i++) {
-        KviCsEventT *slot = EventQueue.EventQueue + i;
-        if (slot->EventNumber == 0)
-            break;
-        if (slot->EventNumber == Number)
-            found = slot;
+        if (EventQueue.EventQueue[i].EventNumber == Number)
+            found = EventQueue.EventQueue + i;
     }
     if (found == nullptr || found->ActiveAlarm != SAHPI_TRUE)
         return SA_OK;
