@@ -29,8 +29,32 @@
 // The texts more than one operation writes.
 #define KVI_EQ_SHUTDOWN_TEXT "Event queue is being shutdown. Somebody isn't being very nice!"
 #define KVI_EQ_NO_RING_TEXT "Cannot put an event into a shutdown queue."
-#define KVI_EQ_DOMAIN_TEXT                                                                         \
-    "Domain IDs other than SAHPI_DEFAULT_DOMAIN_ID are not yet supported. did=%u"
+
+// Only the default domain has a queue.
+#define KVI_EQ_DOMAIN_CHECK(DomainId)                                                              \
+    do {                                                                                           \
+        if ((DomainId) != SAHPI_DEFAULT_DOMAIN_ID) {                                               \
+            KVI_ELOG(                                                                              \
+                KVI_LOG_ERR_NONFATAL,                                                              \
+                "Domain IDs other than SAHPI_DEFAULT_DOMAIN_ID are not yet supported. did=%u",     \
+                (DomainId));                                                                       \
+            return SA_ERR_HPI_INVALID_DOMAIN;                                                      \
+        }                                                                                          \
+    } while (0)
+
+// Takes EventQueueLock into `guard` (a KviReadLock or KviWriteLock) for the
+// rest of the scope and ends the call unless the ring is there.
+#define KVI_EQ_LOCK_RING(GuardT, guard)                                                            \
+    GuardT guard(&EventQueue.EventQueueLock, EVENT_QUEUE_LOCK_TIMEOUT,                             \
+                 KVI_CALL_SITE("&EventQueue.EventQueueLock"));                                     \
+    if (!guard.held()) {                                                                           \
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Can't get EventQueueLock.");                               \
+        return SA_ERR_HPI_ERROR;                                                                   \
+    }                                                                                              \
+    if (EventQueue.EventQueue == nullptr || EventQueue.Current == nullptr) {                       \
+        KVI_WLOG(KVI_LOG_WARN, KVI_EQ_NO_RING_TEXT);                                               \
+        return SA_ERR_HPI_INVALID_REQUEST;                                                         \
+    }
 
 namespace
 {
@@ -296,15 +320,7 @@ struct KviNextEventT {
 SaErrorT readAfter(SaHpiSessionIdT SessionId, SaHpiUint32T LastRead, SaHpiEventT *Event,
                    KviNextEventT *Next) noexcept
 {
-    KVI_READ_GUARD(reader, &EventQueue.EventQueueLock, EVENT_QUEUE_LOCK_TIMEOUT);
-    if (!reader.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Can't get EventQueueLock.");
-        return SA_ERR_HPI_ERROR;
-    }
-    if (EventQueue.EventQueue == nullptr || EventQueue.Current == nullptr) {
-        KVI_WLOG(KVI_LOG_WARN, KVI_EQ_NO_RING_TEXT);
-        return SA_ERR_HPI_INVALID_REQUEST;
-    }
+    KVI_EQ_LOCK_RING(KviReadLock, reader);
     const KviCsEventT *slot = slotAfter(LastRead);
     if (slot->EventNumber == 0) {
         // Only a position from before this queue was created gets here.
@@ -331,15 +347,7 @@ SaErrorT storeLastRead(SaHpiSessionIdT SessionId, SaHpiUint32T Number) noexcept
 SaErrorT resumeAt(SaHpiSessionIdT SessionId, SaHpiUint32T Number) noexcept
 {
     // The hand-over changes slots, so the lock is taken for writing.
-    KVI_WRITE_GUARD(writer, &EventQueue.EventQueueLock, EVENT_QUEUE_LOCK_TIMEOUT);
-    if (!writer.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Can't get EventQueueLock.");
-        return SA_ERR_HPI_ERROR;
-    }
-    if (EventQueue.EventQueue == nullptr || EventQueue.Current == nullptr) {
-        KVI_WLOG(KVI_LOG_WARN, KVI_EQ_NO_RING_TEXT);
-        return SA_ERR_HPI_INVALID_REQUEST;
-    }
+    KVI_EQ_LOCK_RING(KviWriteLock, writer);
     if (EventQueue.Current->EventNumber == 0) {
         KVI_DLOG(KVI_LOG_DBG_H,
                  "The client said that it was resuming an event subscription at event# 0x%8.8x.  "
@@ -546,10 +554,7 @@ SaErrorT kviCsEventQueueFinalize(void) noexcept
 SaErrorT kviCsEventQueueCreate(SaHpiDomainIdT DomainId) noexcept
 {
     KVI_TRACE("DomainId: %u", DomainId);
-    if (DomainId != SAHPI_DEFAULT_DOMAIN_ID) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, KVI_EQ_DOMAIN_TEXT, DomainId);
-        return SA_ERR_HPI_INVALID_DOMAIN;
-    }
+    KVI_EQ_DOMAIN_CHECK(DomainId);
     SaErrorT rc = setUpPrimitives();
     if (rc != SA_OK)
         return rc;
@@ -583,10 +588,7 @@ SaErrorT kviCsEventQueueCreate(SaHpiDomainIdT DomainId) noexcept
 SaErrorT kviCsEventQueueRemove(SaHpiDomainIdT DomainId) noexcept
 {
     KVI_TRACE("DomainId: %u", DomainId);
-    if (DomainId != SAHPI_DEFAULT_DOMAIN_ID) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, KVI_EQ_DOMAIN_TEXT, DomainId);
-        return SA_ERR_HPI_INVALID_DOMAIN;
-    }
+    KVI_EQ_DOMAIN_CHECK(DomainId);
     if (!PrimitivesReady.load(std::memory_order_acquire))
         return SA_OK; // never created
     {
@@ -631,10 +633,7 @@ KVI_EXPORT SaErrorT kviCsPutEvent(SaHpiDomainIdT DomainId, SaHpiEventT *Events,
                  "config file.",
                  static_cast<SaHpiUint32T>(NumberOfEvents), entries, NumberOfEvents - entries);
     }
-    if (DomainId != SAHPI_DEFAULT_DOMAIN_ID) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, KVI_EQ_DOMAIN_TEXT, DomainId);
-        return SA_ERR_HPI_INVALID_DOMAIN;
-    }
+    KVI_EQ_DOMAIN_CHECK(DomainId);
     if (EventQueue.QueueShutdown.load() == SAHPI_TRUE) {
         KVI_WLOG(KVI_LOG_WARN, KVI_EQ_SHUTDOWN_TEXT);
         return SA_ERR_HPI_ERROR;
@@ -643,16 +642,7 @@ KVI_EXPORT SaErrorT kviCsPutEvent(SaHpiDomainIdT DomainId, SaHpiEventT *Events,
         KVI_WLOG(KVI_LOG_WARN, KVI_EQ_NO_RING_TEXT); // no queue was ever created
         return SA_ERR_HPI_INVALID_REQUEST;
     }
-    KVI_WRITE_GUARD(writer, &EventQueue.EventQueueLock, EVENT_QUEUE_LOCK_TIMEOUT);
-    if (!writer.held()) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Can't get EventQueueLock.");
-        return SA_ERR_HPI_ERROR;
-    }
-    if (EventQueue.EventQueue == nullptr || EventQueue.Current == nullptr) {
-        writer.release();
-        KVI_WLOG(KVI_LOG_WARN, KVI_EQ_NO_RING_TEXT);
-        return SA_ERR_HPI_INVALID_REQUEST;
-    }
+    KVI_EQ_LOCK_RING(KviWriteLock, writer);
     const SaHpiUint32T first =
         writeEvents(Events, NumberOfEvents, ActiveAlarm, ActiveAlarmSessionId);
     writer.release();
