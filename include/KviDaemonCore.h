@@ -9,6 +9,7 @@
 #include "kvi/KviConfig.h"
 #include "kvi/KviDomain.h"
 #include "kvi/KviEntitySchema.h"
+#include "kvi/KviEvents.h"
 #include "kvi/KviLogging.h"
 #include "kvi/KviMaplInterface.h"
 #include "kvi/KviMaplManager.h"

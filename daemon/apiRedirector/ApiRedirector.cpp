@@ -4,6 +4,7 @@
 #include <initializer_list>
 #include <type_traits>
 
+#include "core/SaHpi/events/EventManager.h"
 #include "core/utils/KviTrace.h"
 #include "daemon/apiRedirector/ApiRedirector.h"
 #include "kvi/KviApiRedirector.h"
@@ -224,15 +225,15 @@ SaErrorT passOrError(SaErrorT Rc, std::initializer_list<SaErrorT> Passed) noexce
     return SA_ERR_HPI_ERROR;
 }
 
-// The event queue has no unit of its own yet. These two are the only places
-// where it is set up and torn down.
+// The event queue is set up on every initialize and torn down on every
+// finalize; these two are the only places where that happens.
 SaErrorT eventQueueInitialize() noexcept
 {
-    return SA_OK;
+    return kviCsEventQueueInitialize();
 }
 SaErrorT eventQueueFinalize() noexcept
 {
-    return SA_OK;
+    return kviCsEventQueueFinalize();
 }
 
 using KviLifecycleFn = SaErrorT (*)() noexcept;

@@ -110,6 +110,13 @@ void describe(SaHpiDomainIdT DomainId, const SaHpiEventT *Event, SaHpiRdrT *Rdr,
     }
 }
 
+// Every subscribed session sees the event. A queue that is not there (the
+// library not initialized) loses it; the library says so in its log.
+void postEvent(SaHpiDomainIdT DomainId, SaHpiEventT *Event) noexcept
+{
+    kviCsPutEvent(DomainId, Event, 1, SAHPI_FALSE, 0, nullptr);
+}
+
 } // namespace
 
 // ---- Model ----
@@ -120,8 +127,7 @@ void simPublishEvent(SimResourceT *Resource, SaHpiEventT *Event) noexcept
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Simulator: event log of rid=%u out of memory",
                  Resource->ResourceId);
     }
-    // The library's event queue takes the event here once it offers plug-ins
-    // a way to post events through its public header.
+    postEvent(Resource->DomainId, Event);
 }
 
 void simEventLogRelease(SimEventLogT *Log) noexcept
@@ -188,9 +194,17 @@ SaErrorT simEventLogEntryAdd(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSelEntryT *E
         return SA_ERR_HPI_INVALID_PARAMS;
     }
     // A client's entry is taken even while the log is disabled: disabling
-    // stops the resource's own logging only.
-    return simWithResource(UserDefined,
-                           [&](SimResourceT &R) { return append(R.Log, &EvtEntry->Event); });
+    // stops the resource's own logging only. The entry's event is an event
+    // like any other of its type, so subscribers see it too.
+    SaHpiDomainIdT domain = 0;
+    SaErrorT rc = simWithResource(UserDefined, [&](SimResourceT &R) {
+        domain = R.DomainId;
+        return append(R.Log, &EvtEntry->Event);
+    });
+    if (rc == SA_OK) {
+        postEvent(domain, &EvtEntry->Event);
+    }
+    return rc;
 }
 
 SaErrorT simEventLogEntryDelete(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSelEntryIdT EntryId,

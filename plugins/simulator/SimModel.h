@@ -111,6 +111,8 @@ struct SimSensorStateT {
     SaHpiUint32T Raw[8]; // raw thresholds, order as in the shape
     SaHpiSensorEvtEnablesT Enables;
     SaHpiEventStateT State; // event state last evaluated
+    SaHpiBoolT Driven;      // a test or shell set the raw reading
+    SaHpiUint32T DrivenRaw;
 };
 
 struct SimControlStateT {
@@ -290,7 +292,9 @@ void simResourceInitialize(SimResourceT *Resource) noexcept;
 void simResourceDefaults(SimResourceT *Resource) noexcept;
 
 // Event log (SimEventLog.cpp): records an event of the resource in its log
-// when the log is enabled, and passes it on.
+// when the log is enabled, and posts it to the library's event queue. Sensor
+// state changes and watchdog actions come through here; hot-swap state
+// changes (SimResource.cpp) will too, once hot swap posts events.
 void simPublishEvent(SimResourceT *Resource, SaHpiEventT *Event) noexcept;
 void simEventLogRelease(SimEventLogT *Log) noexcept;
 

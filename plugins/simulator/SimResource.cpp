@@ -19,6 +19,9 @@ void stopWatchdogs(SimResourceT &Resource) noexcept
 }
 
 // A client managing hot swap completes a pending insertion or extraction.
+// Hot-swap state changes post no events yet: when they do, each change here
+// and in simHotSwapActionRequest goes to simPublishEvent as a SAHPI_ET_HOTSWAP
+// event with the previous state.
 SaErrorT completePending(void *UserDefined, SaHpiHsStateT Target) noexcept
 {
     return simWithResource(UserDefined, [&](SimResourceT &R) {

@@ -3,6 +3,7 @@
 // of state changes and the active-alarm translation.
 #include <cstring>
 
+#include "KviSimulator.h"
 #include "SimModel.h"
 
 namespace
@@ -128,6 +129,9 @@ SaHpiUint32T rawReading(const SimRecordT *Record) noexcept
 {
     const SimResourceT *resource = Record->Resource;
     const SimSensorShapeT *s = Record->Sensor.Shape;
+    if (Record->Sensor.Driven) {
+        return Record->Sensor.DrivenRaw;
+    }
     switch (s->Source) {
     case SIM_SRC_POWERED:
         return simIsRunning(resource) ? s->NominalRaw : s->OffRaw;
@@ -601,4 +605,34 @@ SaErrorT simActiveAlarmTranslate(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiSensorNu
             static_cast<SaHpiSensorOptionalDataT>(~SAHPI_SOD_PREVIOUS_STATE);
         return SA_OK;
     });
+}
+
+// ---- Driving a reading (KviSimulator.h) ----
+
+extern "C" __attribute__((visibility("default"))) SaErrorT
+kviSimSensorReadingDrive(SaHpiResourceIdT ResourceId, SaHpiSensorNumT SensorNum, SaHpiBoolT Drive,
+                         SaHpiUint32T Raw) noexcept
+{
+    if (Drive > SAHPI_TRUE || Raw > RAW_MAX) {
+        return SA_ERR_HPI_INVALID_PARAMS;
+    }
+    SimResourceT *resource = simFindResource(ResourceId);
+    if (resource == nullptr) {
+        return SA_ERR_HPI_INVALID_RESOURCE;
+    }
+    SimLock lock(resource);
+    for (SaHpiUint32T i = 0; i < resource->RecordCount; i++) {
+        SimRecordT &r = resource->Records[i];
+        if (r.Type != SAHPI_SENSOR_RDR || r.Num != SensorNum || r.Removed) {
+            continue;
+        }
+        if (!r.Sensor.Shape->IsThreshold) {
+            return SA_ERR_HPI_INVALID_CMD;
+        }
+        r.Sensor.Driven = Drive;
+        r.Sensor.DrivenRaw = Raw;
+        evaluate(&r); // a crossing posts its event now, not at the next read
+        return SA_OK;
+    }
+    return SA_ERR_HPI_NOT_PRESENT;
 }

@@ -8,6 +8,7 @@
 #include <cstdio>
 #include <cstdlib>
 
+#include "core/SaHpi/events/EventManager.h"
 #include "core/utils/KviTrace.h"
 
 namespace
@@ -22,11 +23,7 @@ KviSessionIdsT KviCsSessionList[KVI_CS_MAX_SESSIONS];
 KviCsSemaphore KviCsSessionSemaphore;
 SaHpiUint32T nextSession = KVI_CS_SESSION_OFFSET;
 
-SaErrorT wakeNobody(void)
-{
-    return SA_OK;
-}
-std::atomic<KviCsSessionSignalFnT> signalEventThreads{wakeNobody};
+std::atomic<KviCsSessionSignalFnT> signalEventThreads{kviCsSignalEventThreads};
 
 // Index of the open slot that holds SessionId, -1 if none. Every slot is
 // looked at and the last match wins; ids are unique, so this only matters if
@@ -343,7 +340,7 @@ SaErrorT kviCsGetSessionEventSubscription(SaHpiSessionIdT SessionId,
 
 KviCsSessionSignalFnT kviCsSessionSetSignalHook(KviCsSessionSignalFnT Hook) noexcept
 {
-    return signalEventThreads.exchange(Hook != nullptr ? Hook : wakeNobody,
+    return signalEventThreads.exchange(Hook != nullptr ? Hook : kviCsSignalEventThreads,
                                        std::memory_order_acq_rel);
 }
 

@@ -10,10 +10,9 @@
 // never while the table's semaphore is held.
 using KviCsSessionSignalFnT = SaErrorT (*)(void);
 
-// Until the event queue is built into the library the table starts with a
-// hook that wakes nobody (no reader can be blocked yet). The event queue
-// installs its kviCsSignalEventThreads here. Returns the hook that was
-// installed before; nullptr puts the do-nothing hook back.
+// Closing a subscribed session calls kviCsSignalEventThreads of the event
+// queue. Tests put a hook of their own in its place to see the call; the
+// previous hook is returned, and nullptr puts kviCsSignalEventThreads back.
 KviCsSessionSignalFnT kviCsSessionSetSignalHook(KviCsSessionSignalFnT Hook) noexcept;
 
 // Test seams.
