@@ -1584,3 +1584,132 @@ KVI_EXPORT SaErrorT saHpiRdrGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT Reso
 }
 
 } // extern "C"
+
+// ---- Events ----
+
+namespace
+{
+// The record and the entry of an event's source, appended when the caller
+// asks for them. What cannot be appended is marked, never an error: the event
+// itself was delivered.
+void appendRdr(SaHpiSessionIdT SessionId, const SaHpiEventT &Event, SaHpiRdrT *Rdr) noexcept
+{
+    SaHpiDomainIdT domainId = SAHPI_DEFAULT_DOMAIN_ID;
+    SaErrorT rc = kviCsGetDomainFromSession(SessionId, &domainId);
+    if (rc != SA_OK) {
+        KVI_DLOG(KVI_LOG_DBG_H,
+                 "Not appending RDR because session to domain translation failed. rc = %d", rc);
+        Rdr->RdrType = SAHPI_NO_RECORD;
+        return;
+    }
+    const auto type = kviCsRawEnum(Event.EventType);
+    if (type == SAHPI_ET_SENSOR || type == SAHPI_ET_WATCHDOG) {
+        const bool sensor = type == SAHPI_ET_SENSOR;
+        rc = getActiveRdr(SessionId, Event.Source,
+                          sensor ? Event.EventDataUnion.SensorEvent.SensorNum
+                                 : Event.EventDataUnion.WatchdogEvent.WatchdogNum,
+                          sensor ? SAHPI_SENSOR_RDR : SAHPI_WATCHDOG_RDR, Rdr, &domainId, nullptr,
+                          nullptr, nullptr, nullptr);
+    } else {
+        KVI_DLOG(KVI_LOG_DBG_H,
+                 "Not appending RDR because EventType isn't sensor or watchdog. et = %d", type);
+        rc = SA_ERR_HPI_ERROR;
+    }
+    if (rc != SA_OK) {
+        KVI_DLOG(KVI_LOG_DBG_H, "Not appending RDR because getActiveRdr failed. rc = %d", rc);
+        Rdr->RdrType = SAHPI_NO_RECORD;
+    }
+}
+
+// ResourceCapabilities 0 tells the caller that no entry was appended.
+void appendRptEntry(SaHpiSessionIdT SessionId, const SaHpiEventT &Event,
+                    SaHpiRptEntryT *RptEntry) noexcept
+{
+    SaHpiDomainIdT domainId = SAHPI_DEFAULT_DOMAIN_ID;
+    SaErrorT rc = kviCsGetDomainFromSession(SessionId, &domainId);
+    if (rc != SA_OK) {
+        KVI_DLOG(KVI_LOG_DBG_H,
+                 "Not appending RPT because session to domain translation failed. rc = %d", rc);
+        RptEntry->ResourceCapabilities = 0;
+        return;
+    }
+    rc = kviCsRptActiveEntryGetByRid(domainId, Event.Source, RptEntry, nullptr, nullptr, nullptr,
+                                     nullptr);
+    if (rc != SA_OK) {
+        KVI_DLOG(KVI_LOG_DBG_H,
+                 "Not appending RPT because kviCsRptActiveEntryGetByRid failed. rc = %d", rc);
+        RptEntry->ResourceCapabilities = 0;
+    }
+}
+} // namespace
+
+extern "C" {
+
+KVI_EXPORT SaErrorT kviDsSubscribe(SaHpiSessionIdT SessionId, SaHpiBoolT ProvideActiveAlarms,
+                                   SaHpiUint32T *InitialEventNumber) noexcept
+{
+    KVI_TRACE("SessionId: %d, Provide Active alarms: %d", SessionId, ProvideActiveAlarms);
+    REDIR_API_BEGIN_BLOCK(SessionId);
+    // Gathering active alarms calls into the plug-ins: none may be unloaded
+    // meanwhile.
+    KviApiLock<false> master(KVI_CALL_SITE("maplMasterLock"), MASTER_LOCK_TEXTS);
+    SaErrorT rc = master.acquire(maplMasterLock, MAPL_MASTER_LOCK_TIMEOUT);
+    if (rc != SA_OK)
+        REDIR_API_END_BLOCK(rc);
+    rc = kviCsSubscribe(SessionId, ProvideActiveAlarms, InitialEventNumber);
+    if (rc != SA_OK)
+        KVI_DLOG(KVI_LOG_DBG_H, "kviCsSubscribe failed.  rc=%d", rc);
+    master.release();
+    REDIR_API_END_BLOCK(rc);
+}
+
+KVI_EXPORT SaErrorT saHpiUnsubscribe(SaHpiSessionIdT SessionId) noexcept
+{
+    KVI_TRACE("SessionId: %d", SessionId);
+    REDIR_API_BEGIN_BLOCK(SessionId);
+    const SaErrorT rc = kviCsUnsubscribe(SessionId);
+    if (rc != SA_OK)
+        KVI_DLOG(KVI_LOG_DBG_H, "kviCsUnsubscribe failed.  rc=%d", rc);
+    REDIR_API_END_BLOCK(rc);
+}
+
+// The gate stays open while the call waits, so a finalize waits for blocked
+// readers, up to its own time-out.
+KVI_EXPORT SaErrorT kviDsEventGet(SaHpiSessionIdT SessionId, SaHpiTimeoutT Timeout,
+                                  SaHpiEventT *Event, SaHpiUint32T *EventNumber, SaHpiRdrT *Rdr,
+                                  SaHpiRptEntryT *RptEntry) noexcept
+{
+    KVI_TRACE("SessionId: %d", SessionId);
+    KVI_NULL_CHECK(Event);
+    KVI_NULL_CHECK(EventNumber);
+    REDIR_API_BEGIN_BLOCK(SessionId);
+    const SaErrorT rc = kviCsGetEvent(SessionId, Timeout, Event, EventNumber);
+    if (rc != SA_OK)
+        KVI_DLOG(KVI_LOG_DBG_H, "kviCsGetEvent failed.  rc=%d", rc);
+    if (rc != SA_OK && rc != SA_ERR_HPI_DATA_TRUNCATED)
+        REDIR_API_END_BLOCK(rc);
+    if (Rdr != nullptr)
+        appendRdr(SessionId, *Event, Rdr);
+    if (RptEntry != nullptr)
+        appendRptEntry(SessionId, *Event, RptEntry);
+    REDIR_API_END_BLOCK(rc);
+}
+
+// The standard's forms, for clients in the daemon's own process: the event
+// numbers are the library's business.
+KVI_EXPORT SaErrorT saHpiSubscribe(SaHpiSessionIdT SessionId,
+                                   SaHpiBoolT ProvideActiveAlarms) noexcept
+{
+    SaHpiUint32T initial = 0;
+    return kviDsSubscribe(SessionId, ProvideActiveAlarms, &initial);
+}
+
+KVI_EXPORT SaErrorT saHpiEventGet(SaHpiSessionIdT SessionId, SaHpiTimeoutT Timeout,
+                                  SaHpiEventT *Event, SaHpiRdrT *Rdr,
+                                  SaHpiRptEntryT *RptEntry) noexcept
+{
+    SaHpiUint32T number = 0;
+    return kviDsEventGet(SessionId, Timeout, Event, &number, Rdr, RptEntry);
+}
+
+} // extern "C"

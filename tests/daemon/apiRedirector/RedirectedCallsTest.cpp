@@ -401,6 +401,59 @@ TEST_F(RedirectedCallsTest, SetsAreSavedForTheDaemonAndAFailedSaveIsOnlyLogged)
     EXPECT_TRUE(log.contains("kviCsSaveEvtLogStNV failed. rc="));
 }
 
+// A subscriber gets each event with its source's record and entry when it
+// asks; what cannot be appended is marked, and the event still arrives.
+TEST_F(RedirectedCallsTest, EventsArriveWithTheirRecordAndEntryAppended)
+{
+    SaHpiSessionIdT session = 0;
+    ASSERT_EQ(saHpiSessionOpen(SAHPI_DEFAULT_DOMAIN_ID, &session, nullptr), SA_OK);
+    SaHpiUint32T initial = 0;
+    ASSERT_EQ(kviDsSubscribe(session, SAHPI_FALSE, &initial), SA_OK);
+    SaHpiEventT events[3]{};
+    events[0].Source = fake_;
+    events[0].EventType = SAHPI_ET_SENSOR;
+    events[0].EventDataUnion.SensorEvent.SensorNum = 1;
+    events[1].Source = fake_;
+    events[1].EventType = SAHPI_ET_USER;
+    events[2].Source = inactive_;
+    events[2].EventType = SAHPI_ET_SENSOR;
+    events[2].EventDataUnion.SensorEvent.SensorNum = 1;
+    ASSERT_EQ(kviCsPutEvent(0, events, 3, SAHPI_FALSE, 0, nullptr), SA_OK);
+
+    const struct {
+        SaHpiRdrTypeT rdrType;
+        bool entry;
+    } expected[] = {{SAHPI_SENSOR_RDR, true}, {SAHPI_NO_RECORD, true}, {SAHPI_NO_RECORD, false}};
+    SaHpiUint32T last = initial;
+    for (const auto &e : expected) {
+        SaHpiEventT event{};
+        SaHpiUint32T number = 0;
+        SaHpiRdrT rdr{};
+        SaHpiRptEntryT entry{};
+        ASSERT_EQ(kviDsEventGet(session, SAHPI_TIMEOUT_IMMEDIATE, &event, &number, &rdr, &entry),
+                  SA_OK);
+        EXPECT_EQ(number, last + 1);
+        last = number;
+        EXPECT_EQ(rdr.RdrType, e.rdrType);
+        EXPECT_EQ(entry.ResourceCapabilities != 0, e.entry);
+    }
+    SaHpiEventT event{};
+    EXPECT_EQ(saHpiEventGet(session, 1000000, &event, nullptr, nullptr), SA_ERR_HPI_TIMEOUT);
+    EXPECT_EQ(kviDsEventGet(session, 0, nullptr, &last, nullptr, nullptr),
+              SA_ERR_HPI_INVALID_PARAMS);
+
+    // A reader blocked without end wakes when its session closes.
+    std::thread reader([&] {
+        SaHpiEventT e{};
+        EXPECT_EQ(saHpiEventGet(session, SAHPI_TIMEOUT_BLOCK, &e, nullptr, nullptr),
+                  SA_ERR_HPI_INVALID_SESSION);
+    });
+    std::this_thread::sleep_for(std::chrono::milliseconds(50));
+    EXPECT_EQ(saHpiSessionClose(session), SA_OK);
+    reader.join();
+    EXPECT_EQ(saHpiUnsubscribe(session), SA_ERR_HPI_INVALID_SESSION);
+}
+
 // ---- The checks of what a client may set, at their boundaries ----
 
 SaHpiRdrT controlRecord(SaHpiCtrlTypeT Type)
