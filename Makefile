@@ -1,5 +1,5 @@
 # The commands of the README. `make check` is what CI runs.
-PRESETS := default asan tsan
+PRESETS := default asan tsan i386
 
 .PHONY: all deps check build bench demo fuzz clean $(addprefix check-,$(PRESETS))
 

@@ -6,8 +6,8 @@
 
 #include <cerrno>
 #include <cstdint>
-#include <sys/time.h>
 
+#include "core/utils/KviClock.h"
 #include "core/utils/KviTrace.h"
 
 namespace
@@ -58,19 +58,21 @@ void unlockOrDie(KviCsSemaphore *Sem)
         SEM_FATAL("pthread_mutex_unlock failed.");
 }
 
-// Absolute deadline Timeout milliseconds from now on the wall clock. The sum
-// of exactly one second of nanoseconds is left unnormalised, and the range
-// guard divides the current seconds by 1000: both are kept as they have
-// always behaved.
+// Absolute deadline Timeout milliseconds from now, in seconds and
+// microseconds of the monotonic clock that the condition variables wait on:
+// the wall clock's seconds would trip the range guard from late 2037 on, and
+// setting the wall clock would stretch or cut every wait. The sum of exactly
+// one second of nanoseconds is left unnormalised, and the range guard divides
+// the current seconds by 1000: both are kept as they have always behaved.
 SaErrorT deadlineFromNow(const SemLog &log, SaHpiUint32T Timeout, struct timespec *deadline)
 {
-    struct timeval now;
-    if (gettimeofday(&now, nullptr) != 0) {
+    struct timespec now;
+    if (kviCsClockRead(CLOCK_MONOTONIC, &now) != 0) {
         log(KVI_LOG_ERR_NONFATAL, "gettimeofday failed");
         return SA_ERR_HPI_ERROR;
     }
     long long nanos = static_cast<long long>(Timeout % 1000) * 1000000LL +
-                      static_cast<long long>(now.tv_usec) * 1000LL;
+                      static_cast<long long>(now.tv_nsec / 1000) * 1000LL;
     long long seconds = now.tv_sec;
     if (nanos > NANOS_PER_SECOND) {
         nanos -= NANOS_PER_SECOND;
@@ -112,6 +114,21 @@ SaErrorT takeBeforeDeadline(const SemLog &log, KviCsSemaphore *Sem, const struct
     return SA_OK;
 }
 
+// The condition variable measures deadlines on the clock deadlineFromNow
+// reads.
+int initMonotonicCondition(pthread_cond_t *CondVar)
+{
+    pthread_condattr_t attributes;
+    int rc = pthread_condattr_init(&attributes);
+    if (rc != 0)
+        return rc;
+    rc = pthread_condattr_setclock(&attributes, CLOCK_MONOTONIC);
+    if (rc == 0)
+        rc = pthread_cond_init(CondVar, &attributes);
+    pthread_condattr_destroy(&attributes);
+    return rc;
+}
+
 SaErrorT lockMutex(const SemLog &log, KviCsSemaphore *Sem)
 {
     if (pthread_mutex_lock(&Sem->Mutex) != 0) {
@@ -132,7 +149,7 @@ SaErrorT kviCsSemInitBase(SaHpiBoolT UseLogging, KviCsSemaphore *Sem, SaHpiUint3
         return SA_ERR_HPI_INVALID_PARAMS;
     }
     Sem->Value = static_cast<SaHpiInt32T>(InitialValue);
-    int rc = pthread_cond_init(&Sem->CondVar, nullptr);
+    int rc = initMonotonicCondition(&Sem->CondVar);
     if (rc != 0) {
         log(KVI_LOG_ERR_NONFATAL, "pthread_cond_init failed. rc=%d", rc);
         log(KVI_LOG_FUNC_OUT, "Error");

@@ -3,8 +3,7 @@
 // state.
 #include "kvi/KviTime.h"
 
-#include <sys/time.h>
-
+#include "core/utils/KviClock.h"
 #include "core/utils/KviTrace.h"
 
 namespace
@@ -71,14 +70,16 @@ SaErrorT kviCsTimeGetTimeNoLogging(SaHpiUint32T Seconds, SaHpiInt32T Offset, str
 
 SaErrorT readClock(SaHpiUint32T *Seconds, SaHpiUint32T *MSeconds)
 {
-    struct timeval now;
-    if (gettimeofday(&now, nullptr) != 0)
+    struct timespec now;
+    if (kviCsClockRead(CLOCK_REALTIME, &now) != 0)
         return SA_ERR_HPI_ERROR;
     *Seconds = static_cast<SaHpiUint32T>(now.tv_sec);
-    *MSeconds = static_cast<SaHpiUint32T>(now.tv_usec / 1000);
+    *MSeconds = static_cast<SaHpiUint32T>(now.tv_nsec / 1000000);
     return SA_OK;
 }
 } // namespace
+
+KviClockReaderT kviCsClockRead = clock_gettime;
 
 extern "C" {
 
@@ -86,11 +87,11 @@ KVI_EXPORT SaErrorT kviCsGetSaHpiTime(SaHpiTimeT *Time) noexcept
 {
     KVI_TRACE("");
     KVI_NULL_CHECK(Time);
-    struct timeval now;
-    if (gettimeofday(&now, nullptr) != 0)
+    struct timespec now;
+    if (kviCsClockRead(CLOCK_REALTIME, &now) != 0)
         return SA_ERR_HPI_ERROR;
     *Time = static_cast<SaHpiTimeT>(now.tv_sec) * 1000000000LL +
-            static_cast<SaHpiTimeT>(now.tv_usec / 1000) * 1000000LL;
+            static_cast<SaHpiTimeT>(now.tv_nsec / 1000000) * 1000000LL;
     return SA_OK;
 }
 

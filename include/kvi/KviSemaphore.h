@@ -13,6 +13,16 @@
 
 KVI_EXTERN_C_BEGIN
 
+/* The library is built with a 64-bit time_t on every target, and its callers
+ * must agree, or the struct timespec below has another layout on 32-bit x86:
+ * there build with -D_FILE_OFFSET_BITS=64 -D_TIME_BITS=64 (pkg-config and the
+ * CMake package add them). */
+#ifdef __cplusplus
+static_assert(sizeof(time_t) == 8, "KviDaemonCore needs a 64-bit time_t: define _TIME_BITS=64");
+#else
+_Static_assert(sizeof(time_t) == 8, "KviDaemonCore needs a 64-bit time_t: define _TIME_BITS=64");
+#endif
+
 #define KVI_MAX_INT32 0x7FFFFFFF
 #define KVI_MAX_UINT32 0xFFFFFFFFu
 
@@ -39,6 +49,9 @@ KVI_API SaErrorT kviCsSemPostNoLogging(KviCsSemaphore *Sem) KVI_NOEXCEPT;
 KVI_API SaErrorT kviCsSemWaitNoLogging(KviCsSemaphore *Sem, SaHpiUint32T Timeout) KVI_NOEXCEPT;
 KVI_API SaErrorT kviCsSemTryWaitNoLogging(KviCsSemaphore *Sem) KVI_NOEXCEPT;
 
+/* Deadlines are on CLOCK_MONOTONIC, so they hold when the wall clock is set
+ * and past January 2038: wait on one from kviCsConvertTimeoutToTimespec with
+ * kviCsSemWaitTime, or with a condition variable set to that clock. */
 KVI_API SaErrorT kviCsSemWaitTime(KviCsSemaphore *Sem, const struct timespec *Timeout) KVI_NOEXCEPT;
 KVI_API SaErrorT kviCsConvertTimeoutToTimespec(SaHpiUint32T Timeout,
                                                struct timespec *Timespec) KVI_NOEXCEPT;

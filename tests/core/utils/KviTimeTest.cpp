@@ -1,8 +1,11 @@
 #include <gtest/gtest.h>
 
-#include <ctime>
+#include <chrono>
+#include <fcntl.h>
 #include <random>
+#include <sys/stat.h>
 
+#include "core/utils/KviClock.h"
 #include "support/KviTestSupport.h"
 
 SaErrorT kviCsTimeGetTimeNoLoggingForTest(SaHpiUint32T Seconds, SaHpiInt32T Offset,
@@ -37,16 +40,37 @@ TEST(KviTime, BreakdownOfKnownDates)
     EXPECT_EQ(t.tm_hour, 23);
 }
 
-TEST(KviTime, BreakdownAgreesWithTheCLibraryOverTheWholeRange)
+// The standard library's calendar in 64-bit arithmetic: right on both word
+// sizes, where gmtime with a 32-bit time_t wraps in 2038.
+struct tm referenceBreakdown(SaHpiUint32T Seconds)
+{
+    using namespace std::chrono;
+    sys_seconds time{seconds{Seconds}};
+    sys_days day = floor<days>(time);
+    year_month_day date{day};
+    hh_mm_ss clock{time - day};
+    struct tm t {
+    };
+    t.tm_year = static_cast<int>(date.year()) - 1900;
+    t.tm_mon = static_cast<int>(static_cast<unsigned>(date.month())) - 1;
+    t.tm_mday = static_cast<int>(static_cast<unsigned>(date.day()));
+    t.tm_yday = static_cast<int>((day - sys_days{date.year() / January / 1}).count());
+    t.tm_wday = static_cast<int>(weekday{day}.c_encoding());
+    t.tm_hour = static_cast<int>(clock.hours().count());
+    t.tm_min = static_cast<int>(clock.minutes().count());
+    t.tm_sec = static_cast<int>(clock.seconds().count());
+    return t;
+}
+
+TEST(KviTime, BreakdownAgreesWithTheCalendarOverTheWholeRange)
 {
     std::mt19937 random(2026);
     std::uniform_int_distribution<SaHpiUint32T> seconds(0, 0xFFFFFFFFu);
     for (int i = 0; i < 20000; ++i) {
-        SaHpiUint32T s = seconds(random);
-        struct tm ours, theirs;
-        time_t asTime = static_cast<time_t>(s);
+        SaHpiUint32T s = i == 0 ? 0x80000000u : seconds(random); // the first: 2038-01-19
+        struct tm ours;
+        struct tm theirs = referenceBreakdown(s);
         ASSERT_EQ(kviCsTimeGetGmTimeNoLogging(s, &ours), SA_OK);
-        ASSERT_NE(gmtime_r(&asTime, &theirs), nullptr);
         if (theirs.tm_year >= 200)
             continue; // past 2099 the missing century rule is known and accepted
         ASSERT_EQ(ours.tm_year, theirs.tm_year) << s;
@@ -58,6 +82,70 @@ TEST(KviTime, BreakdownAgreesWithTheCLibraryOverTheWholeRange)
                   theirs.tm_hour * 3600 + theirs.tm_min * 60 + theirs.tm_sec)
             << s;
     }
+}
+
+// 2040-02-29 12:34:56.123 UTC, past the 32-bit time_t's end in January 2038.
+constexpr long long LEAP_DAY_2040 = 2214131696LL;
+long long frozenMonotonic = -1; // -1: the real monotonic clock
+
+int frozenClock(clockid_t Clock, struct timespec *Now)
+{
+    if (Clock == CLOCK_MONOTONIC && frozenMonotonic < 0)
+        return clock_gettime(Clock, Now);
+    Now->tv_sec = static_cast<time_t>(Clock == CLOCK_MONOTONIC ? frozenMonotonic : LEAP_DAY_2040);
+    Now->tv_nsec = 123456789;
+    return 0;
+}
+
+// The wall clock stands in 2040 for the object's lifetime.
+struct WallClockIn2040 {
+    WallClockIn2040() { kviCsClockRead = frozenClock; }
+    ~WallClockIn2040()
+    {
+        kviCsClockRead = clock_gettime;
+        frozenMonotonic = -1;
+    }
+};
+
+TEST(KviTime, ReadingsAndDeadlinesPastJanuary2038)
+{
+    static_assert(sizeof(time_t) == 8 && sizeof(off_t) == 8);
+    KviLogCapture log(KVI_LOG_DBG_L_NUM | KVI_LOG_SEM_NUM);
+    WallClockIn2040 clock;
+    SaHpiTimeT hpi = 0;
+    ASSERT_EQ(kviCsGetSaHpiTime(&hpi), SA_OK);
+    EXPECT_EQ(hpi, LEAP_DAY_2040 * 1000000000LL + 123000000LL);
+    KVI_ELOG(KVI_LOG_ERR_NONFATAL, "a line in 2040");
+    EXPECT_TRUE(log.contains("2040/02/29 12:34:56.123 "));
+
+    // Lock deadlines do not follow the wall clock: a wait still lasts its
+    // timeout, through the logged, quiet and deadline forms.
+    KviCsSemaphore sem;
+    ASSERT_EQ(KVI_CS_SEM_INIT(&sem, 0), SA_OK);
+    auto start = std::chrono::steady_clock::now();
+    EXPECT_EQ(KVI_CS_SEM_WAIT(&sem, 200), SA_ERR_HPI_TIMEOUT);
+    EXPECT_EQ(KVI_CS_SEM_NL_WAIT(&sem, 200), SA_ERR_HPI_TIMEOUT);
+    struct timespec deadline;
+    ASSERT_EQ(kviCsConvertTimeoutToTimespec(200, &deadline), SA_OK);
+    EXPECT_EQ(kviCsSemWaitTime(&sem, &deadline), SA_ERR_HPI_TIMEOUT);
+    auto waited = std::chrono::steady_clock::now() - start;
+    EXPECT_GE(waited, std::chrono::milliseconds(590));
+    EXPECT_LT(waited, std::chrono::seconds(3));
+    EXPECT_FALSE(log.contains("Can't honor requested timeout!"));
+    // The range guard still counts the deadline clock's seconds (the logger
+    // cannot write then: its own semaphore refuses the same way).
+    frozenMonotonic = 0x7FFFFFFF - 1000;
+    EXPECT_EQ(KVI_CS_SEM_WAIT(&sem, 200), SA_ERR_HPI_ERROR);
+    frozenMonotonic = -1;
+    EXPECT_EQ(KVI_CS_SEM_DESTROY(&sem), SA_OK);
+
+    KviTempDir dir;
+    std::string path = dir.write("f.txt", "hello");
+    const struct timespec times[2] = {{LEAP_DAY_2040, 0}, {LEAP_DAY_2040, 0}};
+    ASSERT_EQ(utimensat(AT_FDCWD, path.c_str(), times, 0), 0);
+    SaHpiInt64T mtime = 0;
+    ASSERT_EQ(kviCsGetFileInfo(path.c_str(), &mtime, nullptr), SA_OK);
+    EXPECT_EQ(mtime, LEAP_DAY_2040 * 1000000000LL);
 }
 
 TEST(KviTime, ClockReadings)

@@ -1,6 +1,7 @@
 // A writer killed at any moment must leave, after the next start, exactly one
 // complete object per key, holding the value before or after the put that
-// was cut short.
+// was cut short. The writer dies at a chosen file operation of its puts, so
+// every step of a put is cut, whatever the machine's speed.
 #include "core/utils/NonVolatileStorage.h"
 
 #include <atomic>
@@ -10,7 +11,6 @@
 #include <fstream>
 #include <iterator>
 #include <map>
-#include <random>
 #include <string>
 #include <sys/mman.h>
 #include <sys/wait.h>
@@ -24,7 +24,12 @@ namespace
 {
 
 constexpr int KEYS = 4;
-constexpr int KILLS = 300;
+// A replacing put makes seven file operations (open, write and close of the
+// new file, open, sync and close of the directory, unlink of the old file):
+// a cycle of 29 cut points, prime to 7 and to the keys, cuts each step of
+// each key's put.
+constexpr int CUT_POINTS = 29;
+constexpr int KILLS = 4 * CUT_POINTS;
 
 // What the writer had begun and finished, per key, in memory shared with the
 // test so that it survives the writer's death.
@@ -53,8 +58,65 @@ SaErrorT put(int k, SaHpiUint32T generation)
                                value.data());
 }
 
-[[noreturn]] void writeForever(Progress *progress)
+// The writer's file operations pass through until the chosen one, which is
+// cut as a kill or a power loss cuts it: a write lands only in part, any other
+// operation not at all, and the writer dies.
+int operationsBeforeCut;
+size_t cutWriteBytes;
+
+bool cutHere()
 {
+    return operationsBeforeCut-- == 0;
+}
+
+[[noreturn]] void die()
+{
+    raise(SIGKILL);
+    _exit(4);
+}
+
+int cutOpen(const char *Path, int Flags, mode_t Mode)
+{
+    if (cutHere())
+        die();
+    return kviCsNvDefaultFileOps.openFile(Path, Flags, Mode);
+}
+
+ssize_t cutWrite(int Fd, const void *Buffer, size_t Count)
+{
+    if (cutHere()) {
+        kviCsNvDefaultFileOps.writeFile(Fd, Buffer, cutWriteBytes % Count);
+        die();
+    }
+    return kviCsNvDefaultFileOps.writeFile(Fd, Buffer, Count);
+}
+
+template <typename... Args> int cutOr(int (*Operation)(Args...), Args... Arguments)
+{
+    if (cutHere())
+        die();
+    return Operation(Arguments...);
+}
+
+int cutSync(int Fd)
+{
+    return cutOr(kviCsNvDefaultFileOps.syncFile, Fd);
+}
+int cutClose(int Fd)
+{
+    return cutOr(kviCsNvDefaultFileOps.closeFile, Fd);
+}
+int cutUnlink(const char *Path)
+{
+    return cutOr(kviCsNvDefaultFileOps.unlinkFile, Path);
+}
+
+[[noreturn]] void writeUntilCut(Progress *progress, int Cut)
+{
+    operationsBeforeCut = Cut;
+    cutWriteBytes = static_cast<size_t>(Cut) * 7;
+    kviCsNvFileOps = {cutOpen,  kviCsNvDefaultFileOps.readFile, cutWrite, cutSync, cutClose,
+                      cutUnlink};
     for (int k = 0;; k = (k + 1) % KEYS) {
         SaHpiUint32T generation = ++progress->generation;
         progress->started[k] = generation;
@@ -104,21 +166,20 @@ TEST(NvCrashTest, KilledWritersLeaveOneCompleteObjectPerKey)
     for (int k = 0; k < KEYS; ++k)
         ASSERT_EQ(put(k, 0), SA_OK);
 
-    std::mt19937 random(20261121);
     int cutShort = 0;
     int duplicates = 0; // keys with two complete files before the start
+    int damaged = 0;    // partial files before the start
     for (int kill = 0; kill < KILLS && !HasFailure(); ++kill) {
         SCOPED_TRACE("kill " + std::to_string(kill));
         pid_t child = fork();
         ASSERT_GE(child, 0);
         if (child == 0)
-            writeForever(progress);
-        usleep(200 + random() % 3000);
-        ASSERT_EQ(::kill(child, SIGKILL), 0);
+            writeUntilCut(progress, kill % CUT_POINTS);
         int status = 0;
         ASSERT_EQ(waitpid(child, &status, 0), child);
         ASSERT_TRUE(WIFSIGNALED(status)) << "the writer's put failed: status " << status;
         std::map<std::string, int> before = filesByKey(dir);
+        damaged += before.count("") != 0 ? 1 : 0;
         before.erase("");
         for (const auto &[key, count] : before)
             duplicates += count > 1 ? 1 : 0;
@@ -145,8 +206,10 @@ TEST(NvCrashTest, KilledWritersLeaveOneCompleteObjectPerKey)
         }
         EXPECT_EQ(files.size(), static_cast<size_t>(KEYS));
     }
-    // The kills must really have cut puts short, or the test proves little.
-    EXPECT_GT(cutShort, KILLS / 10);
+    // Every kill fell inside a put, some in the middle of its write, some
+    // between the new file and the old one's unlink.
+    EXPECT_EQ(cutShort, KILLS);
+    EXPECT_GT(damaged, 0) << "no write was cut short";
     EXPECT_GT(duplicates, 0) << "no kill fell between the new file and the old one's unlink";
     munmap(shared, sizeof(Progress));
     EXPECT_EQ(kviCsNonVolatileFinalize(), SA_OK);

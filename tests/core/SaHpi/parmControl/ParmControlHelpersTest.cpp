@@ -1,3 +1,7 @@
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+
 #include "core/utils/Memory.h"
 #include "tests/core/SaHpi/parmControl/ParmControlFixture.h"
 
@@ -47,6 +51,113 @@ TEST_F(ParmControlHelpersTest, KeysAndStoredLengthsAreTheRequiredOnes)
     ASSERT_EQ(kviCsSaveResTagNV(0, 9, SAHPI_TRUE, &full), SA_OK);
     EXPECT_EQ(kviCsGetResTagNV(0, 9, SAHPI_TRUE, &out), SA_OK);
     EXPECT_TRUE(same(&out, &full, sizeof full));
+}
+
+std::string fileBytes(const std::filesystem::path &Path)
+{
+    std::ifstream in(Path, std::ios::binary);
+    return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
+}
+
+void setText(SaHpiTextBufferT *Buffer, const char *Text)
+{
+    Buffer->DataType = SAHPI_TL_TYPE_LANGUAGE;
+    Buffer->Language = SAHPI_LANG_ENGLISH;
+    Buffer->DataLength = static_cast<SaHpiUint8T>(strlen(Text));
+    memcpy(Buffer->Data, Text, Buffer->DataLength);
+}
+
+// One setting of each kind, in this order (so in files 0000000000 on), built
+// field by field over zeros so that padding is zero too: what
+// tests/data/nv-store holds.
+struct SavedSettings {
+    SaHpiTextBufferT Tag;
+    SaHpiSeverityT Severity;
+    SaHpiSensorThresholdsT Thresholds;
+    SaHpiSensorEvtEnablesT Enables;
+    SaHpiCtrlStateT Analog, Text;
+    SaHpiUint8T Fru[10];
+
+    SavedSettings()
+    {
+        memset(static_cast<void *>(this), 0, sizeof *this);
+        setText(&Tag, "chassis 1");
+        Severity = SAHPI_MINOR;
+        SaHpiSensorReadingT *readings = &Thresholds.LowCritical;
+        for (SaHpiUint32T i = 0; i < sizeof Thresholds / sizeof *readings; ++i) {
+            readings[i].ValuesPresent = SAHPI_SRF_RAW | SAHPI_SRF_INTERPRETED;
+            readings[i].Raw = 0x01020304u * (i + 1);
+            readings[i].Interpreted.Type = SAHPI_SENSOR_INTERPRETED_TYPE_FLOAT32;
+            readings[i].Interpreted.Value.SensorFloat32 = -1.5f * static_cast<float>(i);
+        }
+        Enables.SensorStatus = SAHPI_SENSTAT_EVENTS_ENABLED;
+        Enables.AssertEvents = 0x8001;
+        Enables.DeassertEvents = 0x0240;
+        Analog.Type = SAHPI_CTRL_TYPE_ANALOG;
+        Analog.StateUnion.Analog = -123456;
+        Text.Type = SAHPI_CTRL_TYPE_TEXT;
+        Text.StateUnion.Text.Line = 3;
+        setText(&Text.StateUnion.Text.Text, "0123456789abcdefghij");
+        memcpy(Fru,
+               "\xff\x00\x01\x02\x80\x7f"
+               "fru!",
+               sizeof Fru);
+    }
+
+    void save() const
+    {
+        ASSERT_EQ(kviCsSaveResTagNV(0, 0x1234, SAHPI_TRUE, &Tag), SA_OK);
+        ASSERT_EQ(kviCsSaveResSeverityNV(0, 0x1234, SAHPI_FALSE, &Severity), SA_OK);
+        ASSERT_EQ(kviCsSaveEvtLogStNV(0, 0x1234, SAHPI_TRUE, SAHPI_TRUE), SA_OK);
+        ASSERT_EQ(kviCsSaveThreshNV(0, 0x1234, 0x56, SAHPI_TRUE, &Thresholds), SA_OK);
+        ASSERT_EQ(kviCsSaveEvtEnablesNV(0, 0x1234, 0x56, SAHPI_FALSE, &Enables), SA_OK);
+        ASSERT_EQ(kviCsSaveCtrlStateNV(0, 0x1234, 7, SAHPI_TRUE, &Analog), SA_OK);
+        ASSERT_EQ(kviCsSaveCtrlStateNV(0, 0x1234, 8, SAHPI_FALSE, &Text), SA_OK);
+        ASSERT_EQ(kviCsSaveFruNV(0, 0x1234, 9, SAHPI_TRUE, sizeof Fru, Fru), SA_OK);
+    }
+};
+
+// Object files and stored lengths are the same on 64-bit and 32-bit x86:
+// each build writes the checked-in store byte for byte and reads it back, so
+// a store written by one build is read by the other.
+TEST_F(ParmControlHelpersTest, StoreFilesAreTheSameOnEveryWordSize)
+{
+    const char *data = getenv("KVI_TEST_DATA_DIR");
+    std::filesystem::path expected =
+        std::filesystem::path(data != nullptr ? data
+                                              : std::filesystem::path(__FILE__).parent_path() /
+                                                    "../../../data") /
+        "nv-store";
+    SavedSettings saved;
+    saved.save();
+    std::filesystem::path written = tmp_.file("nv");
+    size_t files = 0;
+    for (const auto &entry : std::filesystem::directory_iterator(expected)) {
+        SCOPED_TRACE(entry.path().filename().string());
+        ++files;
+        EXPECT_EQ(fileBytes(written / entry.path().filename()), fileBytes(entry.path()));
+    }
+    EXPECT_EQ(files, 8u);
+    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(written), {}), 8);
+
+    SavedSettings read;
+    memset(static_cast<void *>(&read), 0, sizeof read);
+    SaHpiBoolT log = SAHPI_FALSE;
+    SaHpiUint32T fruSize = 0;
+    ASSERT_EQ(kviCsGetResTagNV(0, 0x1234, SAHPI_TRUE, &read.Tag), SA_OK);
+    ASSERT_EQ(kviCsGetResSeverityNV(0, 0x1234, SAHPI_FALSE, &read.Severity), SA_OK);
+    ASSERT_EQ(kviCsGetEvtLogStNV(0, 0x1234, SAHPI_TRUE, &log), SA_OK);
+    ASSERT_EQ(kviCsGetThreshNV(0, 0x1234, 0x56, SAHPI_TRUE, &read.Thresholds), SA_OK);
+    ASSERT_EQ(kviCsGetEvtEnablesNV(0, 0x1234, 0x56, SAHPI_FALSE, &read.Enables), SA_OK);
+    ASSERT_EQ(kviCsGetCtrlStateNV(0, 0x1234, 7, SAHPI_TRUE, &read.Analog), SA_OK);
+    ASSERT_EQ(kviCsGetFruSizeNV(0, 0x1234, 9, SAHPI_TRUE, &fruSize), SA_OK);
+    ASSERT_EQ(kviCsGetFruNV(0, 0x1234, 9, SAHPI_TRUE, sizeof read.Fru, read.Fru), SA_OK);
+    ASSERT_EQ(kviCsGetCtrlStateNV(0, 0x1234, 8, SAHPI_FALSE, &read.Text), SA_OK);
+    EXPECT_EQ(log, SAHPI_TRUE);
+    EXPECT_EQ(fruSize, sizeof saved.Fru);
+    // A text control comes back short of the last seven bytes of its text.
+    memset(saved.Text.StateUnion.Text.Text.Data + 13, 0, 7);
+    EXPECT_TRUE(same(&read, &saved, sizeof saved));
 }
 
 // A text control keeps only DataLength + 10 bytes of its state, so the last
