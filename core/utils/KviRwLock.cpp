@@ -80,6 +80,8 @@ struct RwCall {
     void trace(const char *SrcFile, int SrcLine, const char *SrcFunc, SaHpiUint32T Level,
                const char *phase) const noexcept
     {
+        if (!kviCsLogWanted(Level))
+            return;
         kviCsLogger(SrcFile, static_cast<SaHpiInt16T>(SrcLine), SrcFunc, Level,
                     "%s %s() #%d %#X %s %s", file, func, line,
                     static_cast<unsigned>(reinterpret_cast<uintptr_t>(lock)), word, phase);

@@ -26,7 +26,7 @@ struct SemLog {
     void operator()(const char *file, int line, const char *func, SaHpiUint32T level,
                     const char *format, Args... args) const
     {
-        if (!on)
+        if (!on || !kviCsLogWanted(level))
             return;
         if constexpr (sizeof...(Args) == 0)
             kviCsLogger(file, static_cast<SaHpiInt16T>(line), func, level, "%s", format);
@@ -35,13 +35,13 @@ struct SemLog {
     }
 };
 
-#define SEM_NULL_CHECK(LoggingUse, MySem)                                                         \
-    do {                                                                                          \
-        if ((MySem) == nullptr) {                                                                 \
-            LoggingUse(KVI_LOG_ERR_NONFATAL, "Null passed in for Sem");                           \
-            LoggingUse(KVI_LOG_FUNC_OUT, "Error");                                                \
-            return SA_ERR_HPI_INVALID_PARAMS;                                                     \
-        }                                                                                         \
+#define SEM_NULL_CHECK(LoggingUse, MySem)                                                          \
+    do {                                                                                           \
+        if ((MySem) == nullptr) {                                                                  \
+            LoggingUse(KVI_LOG_ERR_NONFATAL, "Null passed in for Sem");                            \
+            LoggingUse(KVI_LOG_FUNC_OUT, "Error");                                                 \
+            return SA_ERR_HPI_INVALID_PARAMS;                                                      \
+        }                                                                                          \
     } while (0)
 
 [[noreturn]] void fatal(const char *file, int line, const char *func, const char *message)

@@ -21,16 +21,9 @@ SaErrorT kviCsVLogger(const char *SourceFile, SaHpiInt16T LineNumber, const char
 class KviFunctionTrace
 {
   public:
-    KviFunctionTrace(const char *file, int line, const char *func, SaHpiUint32T level,
-                     const char *format, ...) noexcept __attribute__((format(printf, 6, 7)))
-    : file_(file), func_(func), line_(line)
+    KviFunctionTrace(const char *file, int line, const char *func) noexcept
+        : file_(file), func_(func), line_(static_cast<SaHpiInt16T>(line))
     {
-        if (!kviCsLogWanted(level))
-            return;
-        va_list args;
-        va_start(args, format);
-        kviCsVLogger(file, static_cast<SaHpiInt16T>(line), func, level, format, args);
-        va_end(args);
     }
     ~KviFunctionTrace()
     {
@@ -39,6 +32,16 @@ class KviFunctionTrace
     }
     KviFunctionTrace(const KviFunctionTrace &) = delete;
     KviFunctionTrace &operator=(const KviFunctionTrace &) = delete;
+
+    // The entry line; KVI_TRACE calls it only when the level wants it, so a
+    // filtered trace costs no call.
+    void enter(const char *format, ...) noexcept __attribute__((format(printf, 2, 3)))
+    {
+        va_list args;
+        va_start(args, format);
+        kviCsVLogger(file_, line_, func_, KVI_LOG_FUNC_IN_NUM, format, args);
+        va_end(args);
+    }
 
     // The text of the exit line; must outlive the scope (a literal).
     void exitMessage(const char *text) noexcept { exit_ = text; }
@@ -149,7 +152,10 @@ using KviWriteLock = KviRwGuard<true>;
     KviWriteLock var((lock), (timeout), KVI_CALL_SITE(#lock))
 
 // Entry trace of the current function with a printf-style message.
-#define KVI_TRACE(...) KviFunctionTrace trace(KVI_LOG_FUNC_IN, __VA_ARGS__)
+#define KVI_TRACE(...)                                                                             \
+    KviFunctionTrace trace(__FILE__, __LINE__, __func__);                                          \
+    if (kviCsLogWanted(KVI_LOG_FUNC_IN_NUM))                                                       \
+    trace.enter(__VA_ARGS__)
 
 // The integer stored in an enumeration that came from outside (a client, a
 // plug-in, a file), read without taking it for one of the enumerators: such

@@ -143,11 +143,11 @@ SaErrorT kviCsVLogger(const char *SourceFile, SaHpiInt16T LineNumber, const char
         return SA_ERR_HPI_INVALID_PARAMS;
     if (!SemIsInitialized.load(std::memory_order_acquire))
         return SA_ERR_HPI_ERROR;
+    if (!kviCsLogWanted(Level))
+        return SA_OK;
     SaHpiUint32T threadNum = 0;
     if (kviCsThreadNum(&threadNum) != SA_OK)
         threadNum = static_cast<SaHpiUint32T>(-1);
-    if (!kviCsLogWanted(Level))
-        return SA_OK;
     SaHpiUint32T level = normaliseLevel(Level);
 
     char message[KVI_CS_MAX_LOG_STRING_LENGTH];

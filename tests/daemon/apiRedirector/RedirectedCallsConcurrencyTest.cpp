@@ -128,6 +128,7 @@ TEST(RedirectedCallsConcurrencyTest, ClientsCallWhileThePluginSetIsReloaded)
         t.join();
     EXPECT_GT(calls.load(), 0);
     EXPECT_EQ(saHpiFinalize(), SA_OK);
+    EXPECT_EQ(kviCsConfigFinalize(), SA_OK); // stops the watcher
 }
 
 } // namespace
