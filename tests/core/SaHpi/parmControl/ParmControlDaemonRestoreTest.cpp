@@ -4,6 +4,9 @@
 
 namespace
 {
+// The session of the client whose calls the daemon runs make.
+SaHpiSessionIdT clientSession = 0;
+
 using namespace pctest;
 
 // ---------------------------------------------------------------------------
@@ -86,35 +89,29 @@ class Shelf
         return s;
     }
 
-    // What saHpiSensorThresholdsSet, saHpiSensorEventEnablesSet and
-    // saHpiControlStateSet do once the plug-in has taken the value: keep the
-    // daemon's copy. A change on the plug-in's own side keeps none.
+    // A client's set through the HPI call, which keeps the daemon's copy, or
+    // a change on the plug-in's own side, which keeps none.
     void setThresholds(SaHpiResourceIdT Rid, const std::string &Name, SaHpiSensorThresholdsT T,
                        bool ThroughTheApi = true)
     {
         Record &r = rec(Rid, Name);
-        ASSERT_NE(r.Fn.SensorThresholdsSet, nullptr);
-        ASSERT_EQ(r.Fn.SensorThresholdsSet(0, Rid, num(r), &r.Rdr, &T, r.UserData), SA_OK);
-        if (ThroughTheApi) {
-            ASSERT_EQ(kviCsSaveThreshNV(0, Rid, num(r), SAHPI_TRUE, &T), SA_OK);
-        }
+        if (ThroughTheApi)
+            ASSERT_EQ(saHpiSensorThresholdsSet(clientSession, Rid, num(r), &T), SA_OK);
+        else
+            ASSERT_EQ(r.Fn.SensorThresholdsSet(0, Rid, num(r), &r.Rdr, &T, r.UserData), SA_OK);
     }
     void setEnables(SaHpiResourceIdT Rid, const std::string &Name, SaHpiSensorEvtEnablesT E)
     {
-        Record &r = rec(Rid, Name);
-        ASSERT_NE(r.Fn.SensorEventEnablesSet, nullptr);
-        ASSERT_EQ(r.Fn.SensorEventEnablesSet(0, Rid, num(r), &E, &r.Rdr, 0, r.UserData), SA_OK);
-        ASSERT_EQ(kviCsSaveEvtEnablesNV(0, Rid, num(r), SAHPI_TRUE, &E), SA_OK);
+        ASSERT_EQ(saHpiSensorEventEnablesSet(clientSession, Rid, num(rec(Rid, Name)), &E), SA_OK);
     }
     void setControl(SaHpiResourceIdT Rid, const std::string &Name, SaHpiCtrlStateT S,
                     bool ThroughTheApi = true)
     {
         Record &r = rec(Rid, Name);
-        ASSERT_NE(r.Fn.ControlStateSet, nullptr);
-        ASSERT_EQ(r.Fn.ControlStateSet(0, Rid, num(r), &S, r.UserData), SA_OK);
-        if (ThroughTheApi) {
-            ASSERT_EQ(kviCsSaveCtrlStateNV(0, Rid, num(r), SAHPI_TRUE, &S), SA_OK);
-        }
+        if (ThroughTheApi)
+            ASSERT_EQ(saHpiControlStateSet(clientSession, Rid, num(r), &S), SA_OK);
+        else
+            ASSERT_EQ(r.Fn.ControlStateSet(0, Rid, num(r), &S, r.UserData), SA_OK);
     }
 
     // An explicit save or restore of a resource and its sensors and
@@ -178,10 +175,9 @@ template <typename Scenario> void daemonRun(const std::string &Config, Scenario 
             EXPECT_EQ(kviCsConfigInit(SAHPI_FALSE, Config.c_str()), SA_OK);
             EXPECT_EQ(kviDsApiRedirectorInitialize(), SA_OK);
             SaHpiVersionT version = 0;
-            SaHpiSessionIdT session = 0;
             EXPECT_EQ(saHpiInitialize(&version), SA_OK);
-            EXPECT_EQ(saHpiSessionOpen(SAHPI_DEFAULT_DOMAIN_ID, &session, nullptr), SA_OK);
-            EXPECT_EQ(saHpiResourcesDiscover(session), SA_OK);
+            EXPECT_EQ(saHpiSessionOpen(SAHPI_DEFAULT_DOMAIN_ID, &clientSession, nullptr), SA_OK);
+            EXPECT_EQ(saHpiResourcesDiscover(clientSession), SA_OK);
             Shelf shelf;
             shelf.load();
             scenario(shelf, shelf.rid("Chassis 1"), shelf.rid("Processor board 1"));
@@ -217,8 +213,8 @@ TEST(DaemonRestoreDeathTest, ARestartedDaemonPutsBackWhatClientsChangedOnTheSimu
 
         // Clients then change settings through the HPI calls.
         SaHpiTextBufferT tag = text("Rack 7 chassis");
-        EXPECT_EQ(kviCsRptEntryModifyTagByRid(0, chassis, &tag), SA_OK);
-        EXPECT_EQ(kviCsRptEntryModifySeverityByRid(0, chassis, SAHPI_MINOR), SA_OK);
+        EXPECT_EQ(saHpiResourceTagSet(clientSession, chassis, &tag), SA_OK);
+        EXPECT_EQ(saHpiResourceSeveritySet(clientSession, chassis, SAHPI_MINOR), SA_OK);
         shelf.setThresholds(chassis, "Inlet temperature", upperLimits(36, 42));
         const SaHpiEventStateT upper =
             SAHPI_ES_UPPER_MINOR | SAHPI_ES_UPPER_MAJOR | SAHPI_ES_UPPER_CRIT;
