@@ -57,16 +57,17 @@ SaErrorT waitForInput(SaHpiInt32T Desc, int TimeoutMs)
     return rc;
 }
 
-long long monotonicMs()
+long long monotonicNs()
 {
     timespec now;
     clock_gettime(CLOCK_MONOTONIC, &now);
-    return static_cast<long long>(now.tv_sec) * 1000 + now.tv_nsec / 1000000;
+    return static_cast<long long>(now.tv_sec) * 1000000000LL + now.tv_nsec;
 }
 
 // The caller's limit on the whole read. The reads wait for their bytes only
 // within what is left of it, so a peer that sends a header and then stalls,
-// or a second reader that took the input first, holds nobody past it.
+// or a second reader that took the input first, holds nobody past it. What
+// is left is rounded up, so the limit is never cut short either.
 class ReadDeadline
 {
   public:
@@ -75,14 +76,14 @@ class ReadDeadline
     {
         if (limit_ < 0)
             return -1;
-        long long left = limit_ - (monotonicMs() - start_);
-        return left > 0 ? static_cast<int>(left) : 0;
+        long long left = start_ + limit_ * 1000000LL - monotonicNs();
+        return left > 0 ? static_cast<int>((left + 999999) / 1000000) : 0;
     }
     int limitMs() const { return limit_; }
 
   private:
     int limit_;
-    long long start_ = monotonicMs();
+    long long start_ = monotonicNs();
 };
 
 // One read of exactly Size bytes. NumRetries is only a guard: 0 refuses
