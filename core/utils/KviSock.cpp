@@ -45,7 +45,7 @@ SaErrorT resolveServer(const char *Server, in_addr *address)
         return SA_OK;
     hostent entry;
     hostent *found = nullptr;
-    char scratch[2048];
+    char scratch[8192];
     int error = 0;
     if (gethostbyname_r(Server, &entry, scratch, sizeof scratch, &found, &error) != 0 ||
         found == nullptr || found->h_addrtype != AF_INET || found->h_addr_list[0] == nullptr) {
