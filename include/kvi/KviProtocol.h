@@ -218,7 +218,8 @@ enum {
 
 /* ---- Moving whole messages ----------------------------------------------- */
 
-/* Reads one message into Buf, which holds Size bytes.
+/* Reads one message into Buf, which holds Size bytes; on SA_OK Buf holds the
+ * whole message, header first, and its KviMinMsgHdr Size tells how long it is.
  *
  * Waits up to TimeOut milliseconds for input (a negative TimeOut waits
  * without limit; 0 only looks), then takes Sem, the connection's read
@@ -228,17 +229,18 @@ enum {
  * arrives in pieces is refused. The reads wait for their bytes only within
  * what is left of TimeOut.
  *
- * SA_ERR_HPI_TIMEOUT: no input in time, or Sem stayed taken. NumRetries 0
- *   gives SA_ERR_HPI_NO_RESPONSE after reading the header; other values do
- *   not matter.
+ * SA_ERR_HPI_TIMEOUT: no input in time, or Sem stayed taken.
  * SA_ERR_HPI_INVALID_REQUEST: the socket is closed or not open.
- * SA_ERR_HPI_INVALID_DATA: the header came short, or its Size is below 10
- *   (it cannot hold itself) or above the caller's Size (the message would not
- *   fit); nothing after the header is read.
- * SA_ERR_HPI_NO_RESPONSE: the header came but the rest did not, whole.
+ * SA_ERR_HPI_INVALID_DATA: the header came short, or the Size it announces is
+ *   below 10 (it cannot hold the header itself) or above the caller's Size
+ *   (the message would not fit); nothing after the header is read.
+ * SA_ERR_HPI_NO_RESPONSE: the header came but the rest did not, whole; or
+ *   NumRetries is 0, which refuses every message once its header is read
+ *   (any other NumRetries reads alike).
+ * SA_ERR_HPI_ERROR: the wait or a read failed otherwise.
  * SA_ERR_HPI_INVALID_PARAMS: a null pointer, or Size below 10.
- * After any failure but SA_ERR_HPI_TIMEOUT before the header, the stream is
- * no longer at a message boundary: close the connection.
+ * After SA_ERR_HPI_INVALID_DATA or SA_ERR_HPI_NO_RESPONSE the connection is
+ * no longer at a message boundary: close it.
  *
  * To take any message, pass a Size of 65535. */
 KVI_API SaErrorT kviCpsReadProtoMsg(SaHpiInt32T Desc, SaHpiInt32T TimeOut, SaHpiUint32T NumRetries,
