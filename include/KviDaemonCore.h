@@ -16,6 +16,7 @@
 #include "kvi/KviMemory.h"
 #include "kvi/KviNonVolatile.h"
 #include "kvi/KviParmControl.h"
+#include "kvi/KviProtocol.h"
 #include "kvi/KviRdr.h"
 #include "kvi/KviRpt.h"
 #include "kvi/KviRwLock.h"

@@ -1,9 +1,11 @@
 #include "support/KviTestSupport.h"
 
+#include <arpa/inet.h>
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <sstream>
+#include <unistd.h>
 
 #include <gtest/gtest.h>
 
@@ -75,4 +77,22 @@ SaHpiInt32T kviTestLiveBlocks()
     SaHpiInt32T n = 0;
     kviCsGetMemorySegmentsAllocated(&n);
     return n;
+}
+
+KviLoopback::KviLoopback()
+{
+    EXPECT_EQ(kviCsOpenSvrComm(0, 4, &listener), SA_OK);
+    sockaddr_in local{};
+    socklen_t length = sizeof local;
+    EXPECT_EQ(getsockname(listener, reinterpret_cast<sockaddr *>(&local), &length), 0);
+    port = ntohs(local.sin_port);
+    EXPECT_EQ(kviCsOpenClientComm(port, "127.0.0.1", &client), SA_OK);
+    EXPECT_EQ(kviCsAcceptConnection(listener, &server), SA_OK);
+}
+
+KviLoopback::~KviLoopback()
+{
+    for (SaHpiInt32T desc : {client, server, listener})
+        if (desc >= 0)
+            close(desc);
 }

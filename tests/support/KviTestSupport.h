@@ -51,3 +51,17 @@ class KviTempDir
 
 // The allocator's live-block count now.
 SaHpiInt32T kviTestLiveBlocks();
+
+// A TCP connection over 127.0.0.1 made with the library's own socket calls:
+// a listener on a port the kernel picks, the client end and the accepted end.
+// Closes whatever is still open when it goes, the client end first.
+struct KviLoopback {
+    KviLoopback();
+    ~KviLoopback();
+    KviLoopback(const KviLoopback &) = delete;
+    KviLoopback &operator=(const KviLoopback &) = delete;
+    SaHpiInt32T port = 0;
+    SaHpiInt32T listener = -1;
+    SaHpiInt32T client = -1;
+    SaHpiInt32T server = -1;
+};
