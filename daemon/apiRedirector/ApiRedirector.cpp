@@ -617,7 +617,8 @@ bool isBool(SaHpiBoolT Value) noexcept
     return Value == SAHPI_FALSE || Value == SAHPI_TRUE;
 }
 
-template <typename E> bool inRange(E Value, std::underlying_type_t<E> Last) noexcept
+// By reference: a value outside the enumeration is never loaded as one.
+template <typename E> bool inRange(const E &Value, std::underlying_type_t<E> Last) noexcept
 {
     return kviCsRawEnum(Value) <= Last;
 }
@@ -932,7 +933,7 @@ SaErrorT capabilitiesOf(const KviRdrTarget &T, SaHpiCapabilitiesT *Capabilities)
 // Values a C caller passes by value are read as integers and held to their
 // enumeration before anything is locked.
 template <typename E>
-SaErrorT enumArgument(const char *Name, E Value, std::underlying_type_t<E> Last) noexcept
+SaErrorT enumArgument(const char *Name, const E &Value, std::underlying_type_t<E> Last) noexcept
 {
     if (inRange(Value, Last))
         return SA_OK;

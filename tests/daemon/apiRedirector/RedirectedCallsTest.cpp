@@ -298,8 +298,8 @@ TEST_F(RedirectedCallsTest, RefusalsComeBeforeThePlugin)
     SaHpiSensorThresholdsT th{};
     SaHpiParmActionT action;
     storeRaw(action, 3);
-    SaHpiResetActionT reset;
-    storeRaw(reset, 4);
+    // What a C caller can pass; made here without loading it as an enum.
+    const auto reset = static_cast<SaHpiResetActionT>(4);
     KviLogCapture log(KVI_LOG_DBG_H_NUM);
     const struct {
         const char *what;
