@@ -1,5 +1,7 @@
 # The commands of the README. `make check` is what CI runs.
 PRESETS := default asan tsan i386
+# The fuzz recipe reads a fuzz target's status through a pipe.
+SHELL := /bin/bash
 
 .PHONY: all deps check build bench demo fuzz clean $(addprefix check-,$(PRESETS))
 
@@ -28,12 +30,21 @@ demo: build
 bench: build
 	@for b in build/default/bench/*Bench; do echo "== $$b"; $$b || exit 1; done
 
+# Seconds each fuzz target runs: make fuzz FUZZ_SECONDS=600
+FUZZ_SECONDS ?= 60
+
 fuzz: deps
 	cmake --preset fuzz
 	cmake --build --preset fuzz
 	@for f in build/fuzz/fuzz/*Fuzz; do \
 	    n=$$(basename $$f); mkdir -p build/fuzz/work/$$n; echo "== $$n"; \
-	    $$f -max_total_time=60 build/fuzz/work/$$n fuzz/corpus/$$n || exit 1; done
+	    $$f -max_total_time=$(FUZZ_SECONDS) -print_final_stats=1 build/fuzz/work/$$n \
+	        fuzz/corpus/$$n 2>&1 | tee build/fuzz/work/$$n.log; \
+	    test $${PIPESTATUS[0]} -eq 0 || exit 1; done; \
+	echo "== inputs run in $(FUZZ_SECONDS) s each"; \
+	for f in build/fuzz/fuzz/*Fuzz; do n=$$(basename $$f); \
+	    runs=$$(sed -n 's/^stat::number_of_executed_units: *//p' build/fuzz/work/$$n.log); \
+	    printf '%-24s %10d inputs %8d/s\n' $$n $$runs $$((runs / $(FUZZ_SECONDS))); done
 
 clean:
 	rm -rf build

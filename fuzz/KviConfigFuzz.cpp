@@ -1,74 +1,56 @@
-// Feeds arbitrary bytes to the configuration parser, then reads back every
-// pair it kept through the queries. The parser must never read past the
-// buffer (which, as with a file, carries no terminating NUL), and everything
-// it keeps must be a well-formed pair.
-#include <cstdint>
-#include <cstdlib>
-#include <cstring>
-#include <memory>
+// Feeds arbitrary bytes to the configuration parser as the content of a
+// configuration file. The parser must never read past the buffer (which, as
+// with a file, carries no terminating NUL), everything it keeps must be a
+// well-formed pair, and the pairs must be the text's own, in the text's order.
+#include "KviConfigFuzzing.h"
 
-#include "core/utils/KviConfig.h"
+using namespace kviFuzz;
 
 namespace
 {
-void require(bool condition)
+// The first `"value"` (quotes included) in [from, end), or null.
+const char *findQuoted(const char *from, const char *end, const char *value, size_t length)
 {
-    if (!condition)
-        abort();
+    for (const char *q = from; end - q >= static_cast<ptrdiff_t>(length + 2); ++q) {
+        q = static_cast<const char *>(memchr(q, '"', static_cast<size_t>(end - q)));
+        if (q == nullptr || end - q < static_cast<ptrdiff_t>(length + 2))
+            return nullptr;
+        if (memcmp(q + 1, value, length) == 0 && q[length + 1] == '"')
+            return q;
+    }
+    return nullptr;
 }
 
-KviCsCfgContainer &container()
-{
-    static KviCsCfgContainer cont = [] {
-        KviCsCfgContainer c{};
-        require(kviCsSemInitNoLogging(&c.GeneralSem, 1) == SA_OK);
-        require(kviCsSemInitNoLogging(&c.DeleteSem, 1) == SA_OK);
-        return c;
-    }();
-    return cont;
-}
-
-void checkPair(const KviKeyValuePairT *pair, KviCsCfgContainer *cont)
+// Each pair's key and quoted value must occur after the previous pair, before
+// the first NUL (where the walk stops). Taking the first occurrence each time
+// never overtakes where the parser really found them, so a well-behaved
+// parser always passes.
+const char *checkPair(const KviKeyValuePairT *pair, const char *cursor, const char *end)
 {
     size_t keyLength = strlen(pair->Key);
     size_t valueLength = strlen(pair->Value);
     require(keyLength > 0 && keyLength < MAX_KEY_LENGTH);
     require(valueLength < MAX_VALUE_LENGTH);
     require(strspn(pair->Key, KV_VALID_CHARACTERS) == keyLength);
-    require(strchr(pair->Value, '"') == nullptr);
 
-    char small[8];
-    SaErrorT rc = kviCsCfgDataGet(pair->Key, sizeof small, small, cont);
-    require(rc == SA_OK || rc == SA_ERR_HPI_DATA_TRUNCATED);
-    SaHpiUint32T u = 0;
-    SaHpiInt32T s = 0;
-    kviCsCfgDataUint32Get(pair->Key, &u, cont);
-    kviCsCfgDataInt32Get(pair->Key, &s, cont);
-    char element[16];
-    for (SaHpiUint32T i = 0; i < 4; ++i)
-        kviGetListElement(i, pair->Value, sizeof element, element);
+    auto *key = static_cast<const char *>(
+        memmem(cursor, static_cast<size_t>(end - cursor), pair->Key, keyLength));
+    require(key != nullptr);
+    const char *quoted = findQuoted(key + keyLength, end, pair->Value, valueLength);
+    require(quoted != nullptr);
+    return quoted + valueLength + 2;
 }
 } // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size)
 {
-    if (size > 1u << 20)
+    if (size > MAX_INPUT_BYTES)
         return 0;
-    KviCsCfgContainer *cont = &container();
-    KviCsLinkedListT list{};
-    kviCsLinkedListInitialize(&list);
-    cont->KeyValueList = &list;
-
-    // An exact copy, never a null pointer, even for an empty input.
-    std::unique_ptr<char[]> text(new char[size + (size == 0)]);
-    if (size > 0)
-        memcpy(text.get(), data, size);
-    kviCsCfgDataParseData(text.get(), static_cast<SaHpiUint32T>(size), cont);
-
-    for (auto *node = list.HeadPointer; node != nullptr; node = node->Next)
-        checkPair(static_cast<const KviKeyValuePairT *>(node->Data), cont);
-
-    require(kviCsCfgFreeKeyValueList(&list) == SA_OK);
-    cont->KeyValueList = nullptr;
+    ParsedConfig parsed(data, size);
+    const char *cursor = parsed.text();
+    const char *nul = static_cast<const char *>(memchr(cursor, '\0', parsed.size()));
+    const char *end = nul != nullptr ? nul : cursor + parsed.size();
+    for (auto *node = parsed.head(); node != nullptr; node = node->Next)
+        cursor = checkPair(pairOf(node), cursor, end);
     return 0;
 }

@@ -114,5 +114,8 @@ TEST(LinkedListMemory, NodeMallocReportsOutOfSpace)
     EXPECT_EQ(kviTestLiveBlocks(), base + 1);
     EXPECT_EQ(kviCsLinkedListNodeFree(node), SA_OK);
     EXPECT_EQ(kviTestLiveBlocks(), base);
+    EXPECT_EQ(kviCsLinkedListNodeFree(nullptr), SA_OK);
+    EXPECT_TRUE(log.contains("Ptr is NULL."));
+    EXPECT_EQ(kviTestLiveBlocks(), base);
 }
 } // namespace
