@@ -30,7 +30,8 @@ demo: build
 bench: build
 	@for b in build/default/bench/*Bench; do echo "== $$b"; $$b || exit 1; done
 
-# Seconds each fuzz target runs: make fuzz FUZZ_SECONDS=600
+# Seconds each fuzz target runs: make fuzz FUZZ_SECONDS=600. A target's own
+# libFuzzer flags, if any, are in fuzz/<Target>.options.
 FUZZ_SECONDS ?= 60
 
 fuzz: deps
@@ -38,7 +39,8 @@ fuzz: deps
 	cmake --build --preset fuzz
 	@for f in build/fuzz/fuzz/*Fuzz; do \
 	    n=$$(basename $$f); mkdir -p build/fuzz/work/$$n; echo "== $$n"; \
-	    $$f -max_total_time=$(FUZZ_SECONDS) -print_final_stats=1 build/fuzz/work/$$n \
+	    $$f $$(cat fuzz/$$n.options 2>/dev/null) -max_total_time=$(FUZZ_SECONDS) \
+	        -print_final_stats=1 build/fuzz/work/$$n \
 	        fuzz/corpus/$$n 2>&1 | tee build/fuzz/work/$$n.log; \
 	    test $${PIPESTATUS[0]} -eq 0 || exit 1; done; \
 	echo "== inputs run in $(FUZZ_SECONDS) s each"; \
