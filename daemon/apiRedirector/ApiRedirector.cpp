@@ -225,17 +225,6 @@ SaErrorT passOrError(SaErrorT Rc, std::initializer_list<SaErrorT> Passed) noexce
     return SA_ERR_HPI_ERROR;
 }
 
-// The event queue is set up on every initialize and torn down on every
-// finalize; these two are the only places where that happens.
-SaErrorT eventQueueInitialize() noexcept
-{
-    return kviCsEventQueueInitialize();
-}
-SaErrorT eventQueueFinalize() noexcept
-{
-    return kviCsEventQueueFinalize();
-}
-
 using KviLifecycleFn = SaErrorT (*)() noexcept;
 
 // One announced step of initialize or finalize; the failure line names the
@@ -264,7 +253,7 @@ const KviInitStep initSteps[] = {
     {"kviCsRptInitialize", kviCsRptInitialize, true, "kviCsRptInitialize"},
     {"kviCsRdrInitialize", kviCsRdrInitialize, true, "kviCsRdrInitialize"},
     {"kviCsSessionInitialize", kviCsSessionInitialize, true, "kviCsRdrInitialize"},
-    {"kviCsEventQueueInitialize", eventQueueInitialize, false, "kviCsEventQueueInitialize"},
+    {"kviCsEventQueueInitialize", kviCsEventQueueInitialize, false, "kviCsEventQueueInitialize"},
     {"kviDsMaplManagerLoadMapls", kviDsMaplManagerLoadMapls, false, "kviDsMaplManagerLoadMapls"},
 };
 
@@ -344,7 +333,8 @@ KVI_EXPORT SaErrorT saHpiFinalize(void) noexcept
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "kviDsMaplManagerUnloadAllMapls failed. rc=%d", rc);
         return SA_ERR_HPI_ERROR;
     }
-    if (runStep("kviCsEventQueueFinalize", eventQueueFinalize, "kviCsEventQueueFinalize") != SA_OK)
+    if (runStep("kviCsEventQueueFinalize", kviCsEventQueueFinalize, "kviCsEventQueueFinalize") !=
+        SA_OK)
         return SA_ERR_HPI_ERROR;
     if (kviCsCloseAllSessions() != SA_OK)
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "kviCsCloseAllSessions failed!");
