@@ -4,7 +4,9 @@
 #include <initializer_list>
 #include <type_traits>
 
+#include "core/SaHpi/domain/Domain.h"
 #include "core/SaHpi/events/EventManager.h"
+#include "core/SaHpi/parmControl/ParmControlHelpers.h"
 #include "core/utils/KviTrace.h"
 #include "daemon/apiRedirector/ApiRedirector.h"
 #include "kvi/KviApiRedirector.h"
@@ -937,6 +939,29 @@ SaErrorT enumArgument(const char *Name, const E &Value, std::underlying_type_t<E
             return enumRc_;                                                                        \
     } while (0)
 
+// A timeout is SAHPI_TIMEOUT_BLOCK or not negative, held to it like an enum.
+#define KVI_TIMEOUT_CHECK(Arg)                                                                     \
+    do {                                                                                           \
+        if (!kviCsTimeoutIsValid(Arg)) {                                                           \
+            KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid value (%lld) in %s.",                          \
+                     static_cast<long long>(Arg), #Arg);                                           \
+            return SA_ERR_HPI_INVALID_PARAMS;                                                      \
+        }                                                                                          \
+    } while (0)
+
+// Hot swap is for field-replaceable resources: any FRU tells its hot-swap
+// state, and only one with the managed model takes the other requests.
+template <SaHpiCapabilitiesT Needed> SaErrorT hotSwapCapable(const KviRptTarget &T) noexcept
+{
+    if ((T.rptEntry.ResourceCapabilities & Needed) == Needed)
+        return SA_OK;
+    KVI_DLOG(KVI_LOG_DBG_H, "Hot swap capability not set. rid=%u", T.resourceId);
+    return SA_ERR_HPI_INVALID_CMD;
+}
+constexpr auto fruHotSwap = hotSwapCapable<SAHPI_CAPABILITY_FRU>;
+constexpr auto managedHotSwap =
+    hotSwapCapable<SAHPI_CAPABILITY_FRU | SAHPI_CAPABILITY_MANAGED_HOTSWAP>;
+
 } // namespace
 
 extern "C" {
@@ -1410,6 +1435,115 @@ KVI_EXPORT SaErrorT saHpiResourcePowerStateSet(SaHpiSessionIdT SessionId,
         t.fnTable.ResourcePowerStateSet(t.domainId, ResourceId, State, t.userDefined));
 }
 
+// ---- Hot swap ----
+
+KVI_EXPORT SaErrorT saHpiHotSwapControlRequest(SaHpiSessionIdT SessionId,
+                                               SaHpiResourceIdT ResourceId) noexcept
+{
+    KVI_TRACE("sess=%u, rid=%u", SessionId, ResourceId);
+    KVI_REDIRECT(KviRptCall, KVI_RPT_SLOT(HotSwapControlRequest));
+    KVI_OPEN_OR_RETURN({SessionId, ResourceId, false}, managedHotSwap);
+    KviRptTarget &t = call.target();
+    return call.finish(t.fnTable.HotSwapControlRequest(t.domainId, ResourceId, t.userDefined));
+}
+
+KVI_EXPORT SaErrorT saHpiResourceActiveSet(SaHpiSessionIdT SessionId,
+                                           SaHpiResourceIdT ResourceId) noexcept
+{
+    KVI_TRACE("sess=%u, rid=%u", SessionId, ResourceId);
+    KVI_REDIRECT(KviRptCall, KVI_RPT_SLOT(ResourceActiveSet));
+    KVI_OPEN_OR_RETURN({SessionId, ResourceId, false}, managedHotSwap);
+    KviRptTarget &t = call.target();
+    return call.finish(t.fnTable.ResourceActiveSet(t.domainId, ResourceId, t.userDefined));
+}
+
+KVI_EXPORT SaErrorT saHpiResourceInactiveSet(SaHpiSessionIdT SessionId,
+                                             SaHpiResourceIdT ResourceId) noexcept
+{
+    KVI_TRACE("sess=%u, rid=%u", SessionId, ResourceId);
+    KVI_REDIRECT(KviRptCall, KVI_RPT_SLOT(ResourceInactiveSet));
+    KVI_OPEN_OR_RETURN({SessionId, ResourceId, false}, managedHotSwap);
+    KviRptTarget &t = call.target();
+    return call.finish(t.fnTable.ResourceInactiveSet(t.domainId, ResourceId, t.userDefined));
+}
+
+KVI_EXPORT SaErrorT saHpiAutoExtractTimeoutGet(SaHpiSessionIdT SessionId,
+                                               SaHpiResourceIdT ResourceId,
+                                               SaHpiTimeoutT *Timeout) noexcept
+{
+    KVI_TRACE("sess=%u, rid=%u", SessionId, ResourceId);
+    KVI_NULL_CHECK(Timeout);
+    KVI_REDIRECT(KviRptCall, KVI_RPT_SLOT(AutoExtractTimeoutGet));
+    KVI_OPEN_OR_RETURN({SessionId, ResourceId, false}, managedHotSwap);
+    KviRptTarget &t = call.target();
+    return call.finish(
+        t.fnTable.AutoExtractTimeoutGet(t.domainId, ResourceId, t.userDefined, Timeout));
+}
+
+KVI_EXPORT SaErrorT saHpiAutoExtractTimeoutSet(SaHpiSessionIdT SessionId,
+                                               SaHpiResourceIdT ResourceId,
+                                               SaHpiTimeoutT Timeout) noexcept
+{
+    KVI_TRACE("sess=%u, rid=%u, timeout=%lld", SessionId, ResourceId,
+              static_cast<long long>(Timeout));
+    KVI_TIMEOUT_CHECK(Timeout);
+    KVI_REDIRECT(KviRptCall, KVI_RPT_SLOT(AutoExtractTimeoutSet));
+    KVI_OPEN_OR_RETURN({SessionId, ResourceId, false}, managedHotSwap);
+    KviRptTarget &t = call.target();
+    return call.finish(
+        t.fnTable.AutoExtractTimeoutSet(t.domainId, ResourceId, Timeout, t.userDefined));
+}
+
+KVI_EXPORT SaErrorT saHpiHotSwapStateGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId,
+                                         SaHpiHsStateT *State) noexcept
+{
+    KVI_TRACE("sess=%u, rid=%u", SessionId, ResourceId);
+    KVI_NULL_CHECK(State);
+    KVI_REDIRECT(KviRptCall, KVI_RPT_SLOT(HotSwapStateGet));
+    KVI_OPEN_OR_RETURN({SessionId, ResourceId, false}, fruHotSwap);
+    KviRptTarget &t = call.target();
+    return call.finish(t.fnTable.HotSwapStateGet(t.domainId, ResourceId, t.userDefined, State));
+}
+
+KVI_EXPORT SaErrorT saHpiHotSwapActionRequest(SaHpiSessionIdT SessionId,
+                                              SaHpiResourceIdT ResourceId,
+                                              SaHpiHsActionT Action) noexcept
+{
+    KVI_TRACE("sess=%u, rid=%u, action=%d", SessionId, ResourceId, kviCsRawEnum(Action));
+    KVI_ENUM_CHECK(Action, SAHPI_HS_ACTION_EXTRACTION);
+    KVI_REDIRECT(KviRptCall, KVI_RPT_SLOT(HotSwapActionRequest));
+    KVI_OPEN_OR_RETURN({SessionId, ResourceId, false}, managedHotSwap);
+    KviRptTarget &t = call.target();
+    return call.finish(
+        t.fnTable.HotSwapActionRequest(t.domainId, ResourceId, Action, t.userDefined));
+}
+
+KVI_EXPORT SaErrorT saHpiHotSwapIndicatorStateGet(SaHpiSessionIdT SessionId,
+                                                  SaHpiResourceIdT ResourceId,
+                                                  SaHpiHsIndicatorStateT *State) noexcept
+{
+    KVI_TRACE("sess=%u, rid=%u", SessionId, ResourceId);
+    KVI_NULL_CHECK(State);
+    KVI_REDIRECT(KviRptCall, KVI_RPT_SLOT(HotSwapIndicatorStateGet));
+    KVI_OPEN_OR_RETURN({SessionId, ResourceId, false}, managedHotSwap);
+    KviRptTarget &t = call.target();
+    return call.finish(
+        t.fnTable.HotSwapIndicatorStateGet(t.domainId, ResourceId, t.userDefined, State));
+}
+
+KVI_EXPORT SaErrorT saHpiHotSwapIndicatorStateSet(SaHpiSessionIdT SessionId,
+                                                  SaHpiResourceIdT ResourceId,
+                                                  SaHpiHsIndicatorStateT State) noexcept
+{
+    KVI_TRACE("sess=%u, rid=%u, state=%d", SessionId, ResourceId, kviCsRawEnum(State));
+    KVI_ENUM_CHECK(State, SAHPI_HS_INDICATOR_ON);
+    KVI_REDIRECT(KviRptCall, KVI_RPT_SLOT(HotSwapIndicatorStateSet));
+    KVI_OPEN_OR_RETURN({SessionId, ResourceId, false}, managedHotSwap);
+    KviRptTarget &t = call.target();
+    return call.finish(
+        t.fnTable.HotSwapIndicatorStateSet(t.domainId, ResourceId, State, t.userDefined));
+}
+
 // ---- Parameter control ----
 //
 // Not a slot of its own: the library walks the resource and its records
@@ -1701,6 +1835,30 @@ KVI_EXPORT SaErrorT saHpiEventGet(SaHpiSessionIdT SessionId, SaHpiTimeoutT Timeo
 {
     SaHpiUint32T number = 0;
     return kviDsEventGet(SessionId, Timeout, Event, &number, Rdr, RptEntry);
+}
+
+// The auto-insert timeout is the domain's, not a resource's: the library
+// keeps it, the plug-ins read it as their FRUs are inserted, and a change is
+// saved for the daemon's restore like the other settings a client changes.
+KVI_EXPORT SaErrorT saHpiAutoInsertTimeoutGet(SaHpiSessionIdT SessionId,
+                                              SaHpiTimeoutT *Timeout) noexcept
+{
+    KVI_TRACE("sess=%u", SessionId);
+    KVI_NULL_CHECK(Timeout);
+    KVI_TABLE_CALL_BEGIN(SessionId, domainId);
+    REDIR_API_END_BLOCK(kviCsAutoInsertTimeoutGet(domainId, Timeout));
+}
+
+KVI_EXPORT SaErrorT saHpiAutoInsertTimeoutSet(SaHpiSessionIdT SessionId,
+                                              SaHpiTimeoutT Timeout) noexcept
+{
+    KVI_TRACE("sess=%u, timeout=%lld", SessionId, static_cast<long long>(Timeout));
+    KVI_TIMEOUT_CHECK(Timeout);
+    KVI_TABLE_CALL_BEGIN(SessionId, domainId);
+    const SaErrorT rc = kviCsAutoInsertTimeoutSet(domainId, Timeout);
+    if (rc == SA_OK && kviCsSaveAutoInsertTimeoutNV(domainId, SAHPI_TRUE, Timeout) != SA_OK)
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "kviCsSaveAutoInsertTimeoutNV failed.");
+    REDIR_API_END_BLOCK(rc);
 }
 
 } // extern "C"

@@ -38,7 +38,11 @@ typedef struct __KviMaplInitTableT {
  * Every slot receives the domain and resource id first and the UserDefined
  * pointer registered with the RPT entry. Slots that serve a redirected call
  * may be NULL: the call is then refused with SA_ERR_HPI_INVALID_CMD. The
- * hot-swap slots are reserved and never called by this library. */
+ * hot-swap slots are called only for resources whose RPT entry carries
+ * SAHPI_CAPABILITY_FRU (the state read) or SAHPI_CAPABILITY_FRU and
+ * SAHPI_CAPABILITY_MANAGED_HOTSWAP (the others); a hot-swap slot reports a
+ * request that the resource's present state does not allow with
+ * SA_ERR_HPI_INVALID_REQUEST. */
 
 typedef struct __KviDsRptFnTable KviDsRptFnTable;
 
@@ -75,7 +79,8 @@ struct __KviDsRptFnTable {
                                  void *UserDefined, SaHpiBoolT *Enable);
     SaErrorT (*EventLogStateSet)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                  SaHpiBoolT Enable, void *UserDefined);
-    /* 10-16: hot swap, reserved */
+    /* 10-16: hot swap, served by saHpiHotSwap*, saHpiResource(In)ActiveSet and
+     * saHpiAutoExtractTimeout* */
     SaErrorT (*HotSwapControlRequest)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                       void *UserDefined);
     SaErrorT (*ResourceActiveSet)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
@@ -95,7 +100,7 @@ struct __KviDsRptFnTable {
                                       void *UserDefined, SaHpiHsPowerStateT *State);
     SaErrorT (*ResourcePowerStateSet)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                       SaHpiHsPowerStateT State, void *UserDefined);
-    /* 19-20: hot-swap indicator, reserved */
+    /* 19-20: hot-swap indicator, served by saHpiHotSwapIndicatorState* */
     SaErrorT (*HotSwapIndicatorStateGet)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,
                                          void *UserDefined, SaHpiHsIndicatorStateT *State);
     SaErrorT (*HotSwapIndicatorStateSet)(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId,

@@ -35,6 +35,9 @@ KVI_EXTERN_C_BEGIN
 #define KVI_NVKEY_EVENT_ENABLE_PREFIX "kviEvtEnb"
 #define KVI_NVKEY_CONTROL_STATE_PREFIX "kviCtlSte"
 #define KVI_NVKEY_SAVE_FRU_PREFIX "kviSavFru "
+/* A setting of the domain: its key is the prefix, the flag digit and the
+ * domain id ("kviAutoIns100000000"); the value is the 8-byte timeout. */
+#define KVI_NVKEY_AUTO_INSERT_TIMEOUT_PREFIX "kviAutoIns"
 
 /* ---- One resource ---- */
 
@@ -161,8 +164,8 @@ KVI_API SaErrorT kviCsGetFruNV(SaHpiDomainIdT DomainId, SaHpiResourceIdT Resourc
  * (the flag-1 copy). Call it after the plug-ins discovered their resources.
  * A setting that was never changed keeps what the plug-in reported. */
 
-/* Every active resource of the domain; one resource's failure does not stop
- * the others. */
+/* The domain's auto-insert timeout, then every active resource of the
+ * domain; a failure of one does not stop the others. */
 KVI_API SaErrorT kviCsDaemonRestoreDomain(SaHpiDomainIdT DomainId) KVI_NOEXCEPT;
 
 /* One resource: tag, severity, then its sensors and controls. */

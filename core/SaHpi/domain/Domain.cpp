@@ -1,16 +1,27 @@
 // The one domain the daemon serves. Its table and hash lists are static:
 // they live from the first saHpiInitialize to the end of the process and
 // survive finalize/initialize cycles.
+#include <atomic>
 #include <cstdlib>
 
+#include "core/SaHpi/domain/Domain.h"
 #include "core/utils/KviTrace.h"
-#include "kvi/KviDomain.h"
 
 namespace
 {
 KviCsRptContainerT MyRptContainer;
 KviCsLinkedListT MyRptEntries[KVI_CS_DEFAULT_RPT_HASH_SIZE];
 SaHpiBoolT FirstTime = SAHPI_TRUE;
+// Read by plug-in threads as FRUs are inserted, written by client calls.
+std::atomic<SaHpiTimeoutT> AutoInsertTimeout{KVI_CS_DEFAULT_AUTO_INSERT_TIMEOUT};
+
+SaErrorT defaultDomainOnly(SaHpiDomainIdT DomainId) noexcept
+{
+    if (DomainId == SAHPI_DEFAULT_DOMAIN_ID)
+        return SA_OK;
+    KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid Domain Id: %d", DomainId);
+    return SA_ERR_HPI_INVALID_DOMAIN;
+}
 
 // A domain without its lock or lists cannot serve anything; end here rather
 // than fail every later call.
@@ -80,4 +91,28 @@ KVI_EXPORT SaErrorT kviCsGetDomainList(SaHpiUint32T ListSize, SaHpiDomainIdT *Do
     return SA_OK;
 }
 
+KVI_EXPORT SaErrorT kviCsAutoInsertTimeoutGet(SaHpiDomainIdT DomainId,
+                                              SaHpiTimeoutT *Timeout) noexcept
+{
+    KVI_TRACE("domain=%u", DomainId);
+    KVI_NULL_CHECK(Timeout);
+    const SaErrorT rc = defaultDomainOnly(DomainId);
+    if (rc == SA_OK)
+        *Timeout = AutoInsertTimeout.load();
+    return rc;
+}
+
 } // extern "C"
+
+SaErrorT kviCsAutoInsertTimeoutSet(SaHpiDomainIdT DomainId, SaHpiTimeoutT Timeout) noexcept
+{
+    KVI_TRACE("domain=%u, timeout=%lld", DomainId, static_cast<long long>(Timeout));
+    if (!kviCsTimeoutIsValid(Timeout)) {
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Invalid timeout %lld", static_cast<long long>(Timeout));
+        return SA_ERR_HPI_INVALID_PARAMS;
+    }
+    const SaErrorT rc = defaultDomainOnly(DomainId);
+    if (rc == SA_OK)
+        AutoInsertTimeout.store(Timeout);
+    return rc;
+}

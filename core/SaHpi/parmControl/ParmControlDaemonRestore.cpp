@@ -6,6 +6,8 @@
 // keeps whatever the plug-in reported.
 #include "core/SaHpi/parmControl/ParmControlHelpers.h"
 
+#include "core/SaHpi/domain/Domain.h"
+
 namespace
 {
 
@@ -96,11 +98,28 @@ SaErrorT restoreRecord(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId, Kvi
     }
 }
 
+// The domain's own setting comes back before its resources. A value the
+// store holds but the domain refuses (a damaged object) keeps the default.
+void restoreAutoInsertTimeout(SaHpiDomainIdT DomainId) noexcept
+{
+    SaHpiTimeoutT timeout = 0;
+    SaErrorT rc = kviCsGetAutoInsertTimeoutNV(DomainId, SAHPI_TRUE, &timeout);
+    if (rc == SA_ERR_HPI_NOT_PRESENT) {
+        KVI_DLOG(KVI_LOG_DBG_L, "auto-insert timeout was not saved. cannot restore");
+        return;
+    }
+    if (rc == SA_OK)
+        rc = kviCsAutoInsertTimeoutSet(DomainId, timeout);
+    if (rc != SA_OK)
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Failed to restore the auto-insert timeout. rc=%d", rc);
+}
+
 } // namespace
 
 KVI_EXPORT SaErrorT kviCsDaemonRestoreDomain(SaHpiDomainIdT DomainId) noexcept
 {
     KVI_TRACE("domain=%u", DomainId);
+    restoreAutoInsertTimeout(DomainId);
     SaHpiEntryIdT entry = SAHPI_FIRST_ENTRY;
     do {
         SaHpiRptEntryT rptEntry;

@@ -27,9 +27,17 @@ constexpr SaHpiUint32T FRU_LENGTH_WORD = sizeof(SaHpiUint32T);
 constexpr SaHpiUint32T FRU_EXTRA = FRU_LENGTH_WORD + 3;
 constexpr SaHpiUint32T FRU_SIZE_MASK = 0xFFFF;
 
-// A setting's key: of the resource, or with Num of one of its records.
+// A setting's key: of the domain, of the resource, or with Num of one of its
+// records.
 struct NvKey {
     char Text[KVI_MAX_NV_KEY_LENGTH];
+
+    NvKey(const char *Prefix, SaHpiBoolT Flag, SaHpiDomainIdT DomainId) noexcept
+    {
+        snprintf(Text, KVI_MAX_NV_KEY_LENGTH, "%s%d%8.8x", Prefix, Flag ? 1 : 0,
+                 static_cast<unsigned>(DomainId));
+        KVI_DLOG(KVI_LOG_DBG_L, "%s key: %s", Prefix, Text);
+    }
 
     NvKey(const char *Prefix, SaHpiBoolT Flag, SaHpiDomainIdT DomainId,
           SaHpiResourceIdT ResourceId) noexcept
@@ -115,6 +123,26 @@ SaErrorT copyFru(const SaHpiUint8T *Object, SaHpiUint32T BytesRead, SaHpiUint32T
 }
 
 } // namespace
+
+// ---------------------------------------------------------------------------
+// The domain's auto-insert timeout
+
+SaErrorT kviCsSaveAutoInsertTimeoutNV(SaHpiDomainIdT DomainId, SaHpiBoolT IsDaemonSave,
+                                      SaHpiTimeoutT Timeout) noexcept
+{
+    KVI_TRACE("");
+    return putItem(NvKey(KVI_NVKEY_AUTO_INSERT_TIMEOUT_PREFIX, IsDaemonSave, DomainId),
+                   "Storing auto-insert timeout in Non-Vol. memory", sizeof Timeout, &Timeout);
+}
+
+SaErrorT kviCsGetAutoInsertTimeoutNV(SaHpiDomainIdT DomainId, SaHpiBoolT IsDaemonSave,
+                                     SaHpiTimeoutT *Timeout) noexcept
+{
+    KVI_TRACE("");
+    KVI_NULL_CHECK(Timeout);
+    return getWhole(NvKey(KVI_NVKEY_AUTO_INSERT_TIMEOUT_PREFIX, IsDaemonSave, DomainId),
+                    IsDaemonSave, sizeof *Timeout, Timeout);
+}
 
 // ---------------------------------------------------------------------------
 // Event-log state, resource tag, severity

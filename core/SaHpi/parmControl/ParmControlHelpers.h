@@ -92,3 +92,10 @@ SaErrorT kviCsApplySensorEventEnables(SaHpiDomainIdT DomainId, SaHpiResourceIdT 
 SaErrorT kviCsApplyCtrlState(SaHpiDomainIdT DomainId, SaHpiResourceIdT ResourceId, SaHpiRdrT *Rdr,
                              KviDsRdrFnTable *FnTable, void *UserData, SaHpiCtrlStateT *State,
                              SaErrorT NullSlotRc) noexcept;
+
+// The domain's auto-insert timeout in the store: saved and read like the
+// resource settings, under a key of the domain alone.
+SaErrorT kviCsSaveAutoInsertTimeoutNV(SaHpiDomainIdT DomainId, SaHpiBoolT IsDaemonSave,
+                                      SaHpiTimeoutT Timeout) noexcept;
+SaErrorT kviCsGetAutoInsertTimeoutNV(SaHpiDomainIdT DomainId, SaHpiBoolT IsDaemonSave,
+                                     SaHpiTimeoutT *Timeout) noexcept;
