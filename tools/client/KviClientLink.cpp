@@ -17,7 +17,8 @@
 
 #include "coder/KviParamCoder.h"
 
-namespace {
+namespace
+{
 
 constexpr SaHpiUint32T RETRIES = 3;
 constexpr SaHpiUint32T WRITE_TIMEOUT_MS = 5000;

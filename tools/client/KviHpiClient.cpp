@@ -21,7 +21,8 @@
 
 #define KVI_CLIENT_API extern "C" __attribute__((visibility("default")))
 
-namespace {
+namespace
+{
 
 struct AlignedBlock {
     alignas(KVI_WIRE_INVENTORY_ALIGN) SaHpiUint8T Bytes[KVI_WIRE_MAX_MSG];
@@ -87,7 +88,7 @@ SaErrorT callWithin(SaHpiInt32T TimeoutMs, A... Args) noexcept
     }
     KviWireBody response = responseBody();
     return kviWireGetCall<Call<Code>::Dirs>(response, result == SA_OK, Args...) ? result
-                                                                               : SA_ERR_HPI_ERROR;
+                                                                                : SA_ERR_HPI_ERROR;
 }
 
 template <KviMsgTypeT Code, typename... A> SaErrorT call(A... Args) noexcept
@@ -125,8 +126,8 @@ KVI_CLIENT_API SaErrorT saHpiFinalize(void) noexcept
 }
 
 KVI_CLIENT_API SaErrorT saHpiEntityInventoryDataRead(SaHpiSessionIdT SessionId,
-                                                     SaHpiResourceIdT ResourceId,
-                                                     SaHpiEirIdT EirId, SaHpiUint32T BufferSize,
+                                                     SaHpiResourceIdT ResourceId, SaHpiEirIdT EirId,
+                                                     SaHpiUint32T BufferSize,
                                                      SaHpiInventoryDataT *InventData,
                                                      SaHpiUint32T *ActualSize) noexcept
 {
@@ -156,11 +157,11 @@ KVI_CLIENT_API SaErrorT saHpiEntityInventoryDataRead(SaHpiSessionIdT SessionId,
         (used > 0 && kviWireInventoryRelocate(block.Bytes, used) != SA_OK)) {
         return SA_ERR_HPI_ERROR;
     }
-    if (used > 0 && (reinterpret_cast<uintptr_t>(InventData) % KVI_WIRE_INVENTORY_ALIGN != 0 ||
-                     kviWireInventoryFlatten(reinterpret_cast<SaHpiInventoryDataT *>(block.Bytes),
-                                             block.Bytes, used, InventData, BufferSize, &used) !=
-                                 SA_OK ||
-                     kviWireInventoryRelocate(InventData, used) != SA_OK)) {
+    if (used > 0 &&
+        (reinterpret_cast<uintptr_t>(InventData) % KVI_WIRE_INVENTORY_ALIGN != 0 ||
+         kviWireInventoryFlatten(reinterpret_cast<SaHpiInventoryDataT *>(block.Bytes), block.Bytes,
+                                 used, InventData, BufferSize, &used) != SA_OK ||
+         kviWireInventoryRelocate(InventData, used) != SA_OK)) {
         return SA_ERR_HPI_ERROR;
     }
     *ActualSize = actual;
@@ -182,7 +183,8 @@ KVI_CLIENT_API SaErrorT saHpiEntityInventoryDataWrite(SaHpiSessionIdT SessionId,
     // The tree in wire form goes last, its size before it.
     static thread_local AlignedBlock block;
     SaHpiUint32T used = 0;
-    if (kviWireInventoryFlatten(InventData, nullptr, 0, block.Bytes, KVI_WIRE_INVENTORY_MAX, &used) != SA_OK) {
+    if (kviWireInventoryFlatten(InventData, nullptr, 0, block.Bytes, KVI_WIRE_INVENTORY_MAX,
+                                &used) != SA_OK) {
         return SA_ERR_HPI_INVALID_DATA;
     }
     request.put(used);
@@ -195,7 +197,8 @@ KVI_CLIENT_API SaErrorT saHpiEntityInventoryDataWrite(SaHpiSessionIdT SessionId,
     return responseBody().finished() ? result : SA_ERR_HPI_ERROR;
 }
 
-KVI_CLIENT_API SaErrorT saHpiSessionOpen(SaHpiDomainIdT DomainId, SaHpiSessionIdT *SessionId, void *SecurityParams) noexcept
+KVI_CLIENT_API SaErrorT saHpiSessionOpen(SaHpiDomainIdT DomainId, SaHpiSessionIdT *SessionId,
+                                         void *SecurityParams) noexcept
 {
     return call<KVI_SESSION_OPEN_REQ>(DomainId, SessionId, SecurityParams);
 }
@@ -215,82 +218,110 @@ KVI_CLIENT_API SaErrorT saHpiRptInfoGet(SaHpiSessionIdT SessionId, SaHpiRptInfoT
     return call<KVI_RPT_INFO_GET_REQ>(SessionId, RptInfo);
 }
 
-KVI_CLIENT_API SaErrorT saHpiRptEntryGet(SaHpiSessionIdT SessionId, SaHpiEntryIdT EntryId, SaHpiEntryIdT *NextEntryId, SaHpiRptEntryT *RptEntry) noexcept
+KVI_CLIENT_API SaErrorT saHpiRptEntryGet(SaHpiSessionIdT SessionId, SaHpiEntryIdT EntryId,
+                                         SaHpiEntryIdT *NextEntryId,
+                                         SaHpiRptEntryT *RptEntry) noexcept
 {
     return call<KVI_RPT_ENTRY_GET_REQ>(SessionId, EntryId, NextEntryId, RptEntry);
 }
 
-KVI_CLIENT_API SaErrorT saHpiRptEntryGetByResourceId(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiRptEntryT *RptEntry) noexcept
+KVI_CLIENT_API SaErrorT saHpiRptEntryGetByResourceId(SaHpiSessionIdT SessionId,
+                                                     SaHpiResourceIdT ResourceId,
+                                                     SaHpiRptEntryT *RptEntry) noexcept
 {
     return call<KVI_RPT_ENTRY_GET_BY_RESOURCE_ID_REQ>(SessionId, ResourceId, RptEntry);
 }
 
-KVI_CLIENT_API SaErrorT saHpiResourceSeveritySet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiSeverityT Severity) noexcept
+KVI_CLIENT_API SaErrorT saHpiResourceSeveritySet(SaHpiSessionIdT SessionId,
+                                                 SaHpiResourceIdT ResourceId,
+                                                 SaHpiSeverityT Severity) noexcept
 {
     return call<KVI_RESOURCE_SEVERITY_SET_REQ>(SessionId, ResourceId, Severity);
 }
 
-KVI_CLIENT_API SaErrorT saHpiResourceTagSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiTextBufferT *ResourceTag) noexcept
+KVI_CLIENT_API SaErrorT saHpiResourceTagSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId,
+                                            SaHpiTextBufferT *ResourceTag) noexcept
 {
     return call<KVI_RESOURCE_TAG_SET_REQ>(SessionId, ResourceId, ResourceTag);
 }
 
-KVI_CLIENT_API SaErrorT saHpiResourceIdGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT *ResourceId) noexcept
+KVI_CLIENT_API SaErrorT saHpiResourceIdGet(SaHpiSessionIdT SessionId,
+                                           SaHpiResourceIdT *ResourceId) noexcept
 {
     return call<KVI_RESOURCE_ID_GET_REQ>(SessionId, ResourceId);
 }
 
-KVI_CLIENT_API SaErrorT saHpiEntitySchemaGet(SaHpiSessionIdT SessionId, SaHpiUint32T *SchemaId) noexcept
+KVI_CLIENT_API SaErrorT saHpiEntitySchemaGet(SaHpiSessionIdT SessionId,
+                                             SaHpiUint32T *SchemaId) noexcept
 {
     return call<KVI_ENTITY_SCHEMA_GET_REQ>(SessionId, SchemaId);
 }
 
-KVI_CLIENT_API SaErrorT saHpiEventLogInfoGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiSelInfoT *Info) noexcept
+KVI_CLIENT_API SaErrorT saHpiEventLogInfoGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId,
+                                             SaHpiSelInfoT *Info) noexcept
 {
     return call<KVI_EVENT_LOG_INFO_GET_REQ>(SessionId, ResourceId, Info);
 }
 
-KVI_CLIENT_API SaErrorT saHpiEventLogEntryGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiSelEntryIdT EntryId, SaHpiSelEntryIdT *PrevEntryId, SaHpiSelEntryIdT *NextEntryId, SaHpiSelEntryT *EventLogEntry, SaHpiRdrT *Rdr, SaHpiRptEntryT *RptEntry) noexcept
+KVI_CLIENT_API SaErrorT saHpiEventLogEntryGet(SaHpiSessionIdT SessionId,
+                                              SaHpiResourceIdT ResourceId, SaHpiSelEntryIdT EntryId,
+                                              SaHpiSelEntryIdT *PrevEntryId,
+                                              SaHpiSelEntryIdT *NextEntryId,
+                                              SaHpiSelEntryT *EventLogEntry, SaHpiRdrT *Rdr,
+                                              SaHpiRptEntryT *RptEntry) noexcept
 {
-    return call<KVI_EVENT_LOG_ENTRY_GET_REQ>(SessionId, ResourceId, EntryId, PrevEntryId, NextEntryId, EventLogEntry, Rdr, RptEntry);
+    return call<KVI_EVENT_LOG_ENTRY_GET_REQ>(SessionId, ResourceId, EntryId, PrevEntryId,
+                                             NextEntryId, EventLogEntry, Rdr, RptEntry);
 }
 
-KVI_CLIENT_API SaErrorT saHpiEventLogEntryAdd(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiSelEntryT *EvtEntry) noexcept
+KVI_CLIENT_API SaErrorT saHpiEventLogEntryAdd(SaHpiSessionIdT SessionId,
+                                              SaHpiResourceIdT ResourceId,
+                                              SaHpiSelEntryT *EvtEntry) noexcept
 {
     return call<KVI_EVENT_LOG_ENTRY_ADD_REQ>(SessionId, ResourceId, EvtEntry);
 }
 
-KVI_CLIENT_API SaErrorT saHpiEventLogEntryDelete(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiSelEntryIdT EntryId) noexcept
+KVI_CLIENT_API SaErrorT saHpiEventLogEntryDelete(SaHpiSessionIdT SessionId,
+                                                 SaHpiResourceIdT ResourceId,
+                                                 SaHpiSelEntryIdT EntryId) noexcept
 {
     return call<KVI_EVENT_LOG_ENTRY_DELETE_REQ>(SessionId, ResourceId, EntryId);
 }
 
-KVI_CLIENT_API SaErrorT saHpiEventLogClear(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId) noexcept
+KVI_CLIENT_API SaErrorT saHpiEventLogClear(SaHpiSessionIdT SessionId,
+                                           SaHpiResourceIdT ResourceId) noexcept
 {
     return call<KVI_EVENT_LOG_CLEAR_REQ>(SessionId, ResourceId);
 }
 
-KVI_CLIENT_API SaErrorT saHpiEventLogTimeGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiTimeT *Time) noexcept
+KVI_CLIENT_API SaErrorT saHpiEventLogTimeGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId,
+                                             SaHpiTimeT *Time) noexcept
 {
     return call<KVI_EVENT_LOG_TIME_GET_REQ>(SessionId, ResourceId, Time);
 }
 
-KVI_CLIENT_API SaErrorT saHpiEventLogTimeSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiTimeT Time) noexcept
+KVI_CLIENT_API SaErrorT saHpiEventLogTimeSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId,
+                                             SaHpiTimeT Time) noexcept
 {
     return call<KVI_EVENT_LOG_TIME_SET_REQ>(SessionId, ResourceId, Time);
 }
 
-KVI_CLIENT_API SaErrorT saHpiEventLogStateGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiBoolT *Enable) noexcept
+KVI_CLIENT_API SaErrorT saHpiEventLogStateGet(SaHpiSessionIdT SessionId,
+                                              SaHpiResourceIdT ResourceId,
+                                              SaHpiBoolT *Enable) noexcept
 {
     return call<KVI_EVENT_LOG_STATE_GET_REQ>(SessionId, ResourceId, Enable);
 }
 
-KVI_CLIENT_API SaErrorT saHpiEventLogStateSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiBoolT Enable) noexcept
+KVI_CLIENT_API SaErrorT saHpiEventLogStateSet(SaHpiSessionIdT SessionId,
+                                              SaHpiResourceIdT ResourceId,
+                                              SaHpiBoolT Enable) noexcept
 {
     return call<KVI_EVENT_LOG_STATE_SET_REQ>(SessionId, ResourceId, Enable);
 }
 
-KVI_CLIENT_API SaErrorT saHpiSubscribe(SaHpiSessionIdT SessionId, SaHpiBoolT ProvideActiveAlarms) noexcept
+KVI_CLIENT_API SaErrorT saHpiSubscribe(SaHpiSessionIdT SessionId,
+                                       SaHpiBoolT ProvideActiveAlarms) noexcept
 {
     return call<KVI_SUBSCRIBE_REQ>(SessionId, ProvideActiveAlarms);
 }
@@ -300,157 +331,222 @@ KVI_CLIENT_API SaErrorT saHpiUnsubscribe(SaHpiSessionIdT SessionId) noexcept
     return call<KVI_UNSUBSCRIBE_REQ>(SessionId);
 }
 
-KVI_CLIENT_API SaErrorT saHpiEventGet(SaHpiSessionIdT SessionId, SaHpiTimeoutT Timeout, SaHpiEventT *Event, SaHpiRdrT *Rdr, SaHpiRptEntryT *RptEntry) noexcept
+KVI_CLIENT_API SaErrorT saHpiEventGet(SaHpiSessionIdT SessionId, SaHpiTimeoutT Timeout,
+                                      SaHpiEventT *Event, SaHpiRdrT *Rdr,
+                                      SaHpiRptEntryT *RptEntry) noexcept
 {
-    return callWithin<KVI_EVENT_GET_REQ>(eventTimeout(Timeout), SessionId, Timeout, Event, Rdr, RptEntry);
+    return callWithin<KVI_EVENT_GET_REQ>(eventTimeout(Timeout), SessionId, Timeout, Event, Rdr,
+                                         RptEntry);
 }
 
-KVI_CLIENT_API SaErrorT saHpiRdrGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiEntryIdT EntryId, SaHpiEntryIdT *NextEntryId, SaHpiRdrT *Rdr) noexcept
+KVI_CLIENT_API SaErrorT saHpiRdrGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId,
+                                    SaHpiEntryIdT EntryId, SaHpiEntryIdT *NextEntryId,
+                                    SaHpiRdrT *Rdr) noexcept
 {
     return call<KVI_RDR_GET_REQ>(SessionId, ResourceId, EntryId, NextEntryId, Rdr);
 }
 
-KVI_CLIENT_API SaErrorT saHpiSensorReadingGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiSensorNumT SensorNum, SaHpiSensorReadingT *Reading) noexcept
+KVI_CLIENT_API SaErrorT saHpiSensorReadingGet(SaHpiSessionIdT SessionId,
+                                              SaHpiResourceIdT ResourceId,
+                                              SaHpiSensorNumT SensorNum,
+                                              SaHpiSensorReadingT *Reading) noexcept
 {
     return call<KVI_SENSOR_READING_GET_REQ>(SessionId, ResourceId, SensorNum, Reading);
 }
 
-KVI_CLIENT_API SaErrorT saHpiSensorReadingConvert(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiSensorNumT SensorNum, SaHpiSensorReadingT *ReadingInput, SaHpiSensorReadingT *ConvertedReading) noexcept
+KVI_CLIENT_API SaErrorT saHpiSensorReadingConvert(SaHpiSessionIdT SessionId,
+                                                  SaHpiResourceIdT ResourceId,
+                                                  SaHpiSensorNumT SensorNum,
+                                                  SaHpiSensorReadingT *ReadingInput,
+                                                  SaHpiSensorReadingT *ConvertedReading) noexcept
 {
-    return call<KVI_SENSOR_READING_CONVERT_REQ>(SessionId, ResourceId, SensorNum, ReadingInput, ConvertedReading);
+    return call<KVI_SENSOR_READING_CONVERT_REQ>(SessionId, ResourceId, SensorNum, ReadingInput,
+                                                ConvertedReading);
 }
 
-KVI_CLIENT_API SaErrorT saHpiSensorThresholdsGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiSensorNumT SensorNum, SaHpiSensorThresholdsT *SensorThresholds) noexcept
+KVI_CLIENT_API SaErrorT saHpiSensorThresholdsGet(SaHpiSessionIdT SessionId,
+                                                 SaHpiResourceIdT ResourceId,
+                                                 SaHpiSensorNumT SensorNum,
+                                                 SaHpiSensorThresholdsT *SensorThresholds) noexcept
 {
     return call<KVI_SENSOR_THRESHOLDS_GET_REQ>(SessionId, ResourceId, SensorNum, SensorThresholds);
 }
 
-KVI_CLIENT_API SaErrorT saHpiSensorThresholdsSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiSensorNumT SensorNum, SaHpiSensorThresholdsT *SensorThresholds) noexcept
+KVI_CLIENT_API SaErrorT saHpiSensorThresholdsSet(SaHpiSessionIdT SessionId,
+                                                 SaHpiResourceIdT ResourceId,
+                                                 SaHpiSensorNumT SensorNum,
+                                                 SaHpiSensorThresholdsT *SensorThresholds) noexcept
 {
     return call<KVI_SENSOR_THRESHOLDS_SET_REQ>(SessionId, ResourceId, SensorNum, SensorThresholds);
 }
 
-KVI_CLIENT_API SaErrorT saHpiSensorTypeGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiSensorNumT SensorNum, SaHpiSensorTypeT *Type, SaHpiEventCategoryT *Category) noexcept
+KVI_CLIENT_API SaErrorT saHpiSensorTypeGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId,
+                                           SaHpiSensorNumT SensorNum, SaHpiSensorTypeT *Type,
+                                           SaHpiEventCategoryT *Category) noexcept
 {
     return call<KVI_SENSOR_TYPE_GET_REQ>(SessionId, ResourceId, SensorNum, Type, Category);
 }
 
-KVI_CLIENT_API SaErrorT saHpiSensorEventEnablesGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiSensorNumT SensorNum, SaHpiSensorEvtEnablesT *Enables) noexcept
+KVI_CLIENT_API SaErrorT saHpiSensorEventEnablesGet(SaHpiSessionIdT SessionId,
+                                                   SaHpiResourceIdT ResourceId,
+                                                   SaHpiSensorNumT SensorNum,
+                                                   SaHpiSensorEvtEnablesT *Enables) noexcept
 {
     return call<KVI_SENSOR_EVENT_ENABLES_GET_REQ>(SessionId, ResourceId, SensorNum, Enables);
 }
 
-KVI_CLIENT_API SaErrorT saHpiSensorEventEnablesSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiSensorNumT SensorNum, SaHpiSensorEvtEnablesT *Enables) noexcept
+KVI_CLIENT_API SaErrorT saHpiSensorEventEnablesSet(SaHpiSessionIdT SessionId,
+                                                   SaHpiResourceIdT ResourceId,
+                                                   SaHpiSensorNumT SensorNum,
+                                                   SaHpiSensorEvtEnablesT *Enables) noexcept
 {
     return call<KVI_SENSOR_EVENT_ENABLES_SET_REQ>(SessionId, ResourceId, SensorNum, Enables);
 }
 
-KVI_CLIENT_API SaErrorT saHpiControlTypeGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiCtrlNumT CtrlNum, SaHpiCtrlTypeT *Type) noexcept
+KVI_CLIENT_API SaErrorT saHpiControlTypeGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId,
+                                            SaHpiCtrlNumT CtrlNum, SaHpiCtrlTypeT *Type) noexcept
 {
     return call<KVI_CONTROL_TYPE_GET_REQ>(SessionId, ResourceId, CtrlNum, Type);
 }
 
-KVI_CLIENT_API SaErrorT saHpiControlStateGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiCtrlNumT CtrlNum, SaHpiCtrlStateT *CtrlState) noexcept
+KVI_CLIENT_API SaErrorT saHpiControlStateGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId,
+                                             SaHpiCtrlNumT CtrlNum,
+                                             SaHpiCtrlStateT *CtrlState) noexcept
 {
     return call<KVI_CONTROL_STATE_GET_REQ>(SessionId, ResourceId, CtrlNum, CtrlState);
 }
 
-KVI_CLIENT_API SaErrorT saHpiControlStateSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiCtrlNumT CtrlNum, SaHpiCtrlStateT *CtrlState) noexcept
+KVI_CLIENT_API SaErrorT saHpiControlStateSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId,
+                                             SaHpiCtrlNumT CtrlNum,
+                                             SaHpiCtrlStateT *CtrlState) noexcept
 {
     return call<KVI_CONTROL_STATE_SET_REQ>(SessionId, ResourceId, CtrlNum, CtrlState);
 }
 
-KVI_CLIENT_API SaErrorT saHpiWatchdogTimerGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiWatchdogNumT WatchdogNum, SaHpiWatchdogT *Watchdog) noexcept
+KVI_CLIENT_API SaErrorT saHpiWatchdogTimerGet(SaHpiSessionIdT SessionId,
+                                              SaHpiResourceIdT ResourceId,
+                                              SaHpiWatchdogNumT WatchdogNum,
+                                              SaHpiWatchdogT *Watchdog) noexcept
 {
     return call<KVI_WATCHDOG_TIMER_GET_REQ>(SessionId, ResourceId, WatchdogNum, Watchdog);
 }
 
-KVI_CLIENT_API SaErrorT saHpiWatchdogTimerSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiWatchdogNumT WatchdogNum, SaHpiWatchdogT *Watchdog) noexcept
+KVI_CLIENT_API SaErrorT saHpiWatchdogTimerSet(SaHpiSessionIdT SessionId,
+                                              SaHpiResourceIdT ResourceId,
+                                              SaHpiWatchdogNumT WatchdogNum,
+                                              SaHpiWatchdogT *Watchdog) noexcept
 {
     return call<KVI_WATCHDOG_TIMER_SET_REQ>(SessionId, ResourceId, WatchdogNum, Watchdog);
 }
 
-KVI_CLIENT_API SaErrorT saHpiWatchdogTimerReset(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiWatchdogNumT WatchdogNum) noexcept
+KVI_CLIENT_API SaErrorT saHpiWatchdogTimerReset(SaHpiSessionIdT SessionId,
+                                                SaHpiResourceIdT ResourceId,
+                                                SaHpiWatchdogNumT WatchdogNum) noexcept
 {
     return call<KVI_WATCHDOG_TIMER_RESET_REQ>(SessionId, ResourceId, WatchdogNum);
 }
 
-KVI_CLIENT_API SaErrorT saHpiHotSwapControlRequest(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId) noexcept
+KVI_CLIENT_API SaErrorT saHpiHotSwapControlRequest(SaHpiSessionIdT SessionId,
+                                                   SaHpiResourceIdT ResourceId) noexcept
 {
     return call<KVI_HOTSWAP_CONTROL_REQUEST_REQ>(SessionId, ResourceId);
 }
 
-KVI_CLIENT_API SaErrorT saHpiResourceActiveSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId) noexcept
+KVI_CLIENT_API SaErrorT saHpiResourceActiveSet(SaHpiSessionIdT SessionId,
+                                               SaHpiResourceIdT ResourceId) noexcept
 {
     return call<KVI_RESOURCE_ACTIVE_SET_REQ>(SessionId, ResourceId);
 }
 
-KVI_CLIENT_API SaErrorT saHpiResourceInactiveSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId) noexcept
+KVI_CLIENT_API SaErrorT saHpiResourceInactiveSet(SaHpiSessionIdT SessionId,
+                                                 SaHpiResourceIdT ResourceId) noexcept
 {
     return call<KVI_RESOURCE_INACTIVE_SET_REQ>(SessionId, ResourceId);
 }
 
-KVI_CLIENT_API SaErrorT saHpiAutoInsertTimeoutGet(SaHpiSessionIdT SessionId, SaHpiTimeoutT *Timeout) noexcept
+KVI_CLIENT_API SaErrorT saHpiAutoInsertTimeoutGet(SaHpiSessionIdT SessionId,
+                                                  SaHpiTimeoutT *Timeout) noexcept
 {
     return call<KVI_AUTO_INSERT_TIMEOUT_GET_REQ>(SessionId, Timeout);
 }
 
-KVI_CLIENT_API SaErrorT saHpiAutoInsertTimeoutSet(SaHpiSessionIdT SessionId, SaHpiTimeoutT Timeout) noexcept
+KVI_CLIENT_API SaErrorT saHpiAutoInsertTimeoutSet(SaHpiSessionIdT SessionId,
+                                                  SaHpiTimeoutT Timeout) noexcept
 {
     return call<KVI_AUTO_INSERT_TIMEOUT_SET_REQ>(SessionId, Timeout);
 }
 
-KVI_CLIENT_API SaErrorT saHpiAutoExtractTimeoutGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiTimeoutT *Timeout) noexcept
+KVI_CLIENT_API SaErrorT saHpiAutoExtractTimeoutGet(SaHpiSessionIdT SessionId,
+                                                   SaHpiResourceIdT ResourceId,
+                                                   SaHpiTimeoutT *Timeout) noexcept
 {
     return call<KVI_AUTO_EXTRACT_TIMEOUT_GET_REQ>(SessionId, ResourceId, Timeout);
 }
 
-KVI_CLIENT_API SaErrorT saHpiAutoExtractTimeoutSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiTimeoutT Timeout) noexcept
+KVI_CLIENT_API SaErrorT saHpiAutoExtractTimeoutSet(SaHpiSessionIdT SessionId,
+                                                   SaHpiResourceIdT ResourceId,
+                                                   SaHpiTimeoutT Timeout) noexcept
 {
     return call<KVI_AUTO_EXTRACT_TIMEOUT_SET_REQ>(SessionId, ResourceId, Timeout);
 }
 
-KVI_CLIENT_API SaErrorT saHpiHotSwapStateGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiHsStateT *State) noexcept
+KVI_CLIENT_API SaErrorT saHpiHotSwapStateGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId,
+                                             SaHpiHsStateT *State) noexcept
 {
     return call<KVI_HOTSWAP_STATE_GET_REQ>(SessionId, ResourceId, State);
 }
 
-KVI_CLIENT_API SaErrorT saHpiHotSwapActionRequest(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiHsActionT Action) noexcept
+KVI_CLIENT_API SaErrorT saHpiHotSwapActionRequest(SaHpiSessionIdT SessionId,
+                                                  SaHpiResourceIdT ResourceId,
+                                                  SaHpiHsActionT Action) noexcept
 {
     return call<KVI_HOTSWAP_ACTION_REQUEST_REQ>(SessionId, ResourceId, Action);
 }
 
-KVI_CLIENT_API SaErrorT saHpiResourcePowerStateGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiHsPowerStateT *State) noexcept
+KVI_CLIENT_API SaErrorT saHpiResourcePowerStateGet(SaHpiSessionIdT SessionId,
+                                                   SaHpiResourceIdT ResourceId,
+                                                   SaHpiHsPowerStateT *State) noexcept
 {
     return call<KVI_RESOURCE_POWER_STATE_GET_REQ>(SessionId, ResourceId, State);
 }
 
-KVI_CLIENT_API SaErrorT saHpiResourcePowerStateSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiHsPowerStateT State) noexcept
+KVI_CLIENT_API SaErrorT saHpiResourcePowerStateSet(SaHpiSessionIdT SessionId,
+                                                   SaHpiResourceIdT ResourceId,
+                                                   SaHpiHsPowerStateT State) noexcept
 {
     return call<KVI_RESOURCE_POWER_STATE_SET_REQ>(SessionId, ResourceId, State);
 }
 
-KVI_CLIENT_API SaErrorT saHpiHotSwapIndicatorStateGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiHsIndicatorStateT *State) noexcept
+KVI_CLIENT_API SaErrorT saHpiHotSwapIndicatorStateGet(SaHpiSessionIdT SessionId,
+                                                      SaHpiResourceIdT ResourceId,
+                                                      SaHpiHsIndicatorStateT *State) noexcept
 {
     return call<KVI_HOTSWAP_INDICATOR_STATE_GET_REQ>(SessionId, ResourceId, State);
 }
 
-KVI_CLIENT_API SaErrorT saHpiHotSwapIndicatorStateSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiHsIndicatorStateT State) noexcept
+KVI_CLIENT_API SaErrorT saHpiHotSwapIndicatorStateSet(SaHpiSessionIdT SessionId,
+                                                      SaHpiResourceIdT ResourceId,
+                                                      SaHpiHsIndicatorStateT State) noexcept
 {
     return call<KVI_HOTSWAP_INDICATOR_STATE_SET_REQ>(SessionId, ResourceId, State);
 }
 
-KVI_CLIENT_API SaErrorT saHpiParmControl(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiParmActionT Action) noexcept
+KVI_CLIENT_API SaErrorT saHpiParmControl(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId,
+                                         SaHpiParmActionT Action) noexcept
 {
     return call<KVI_PARM_CONTROL_REQ>(SessionId, ResourceId, Action);
 }
 
-KVI_CLIENT_API SaErrorT saHpiResourceResetStateGet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiResetActionT *ResetAction) noexcept
+KVI_CLIENT_API SaErrorT saHpiResourceResetStateGet(SaHpiSessionIdT SessionId,
+                                                   SaHpiResourceIdT ResourceId,
+                                                   SaHpiResetActionT *ResetAction) noexcept
 {
     return call<KVI_RESOURCE_RESET_STATE_GET_REQ>(SessionId, ResourceId, ResetAction);
 }
 
-KVI_CLIENT_API SaErrorT saHpiResourceResetStateSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId, SaHpiResetActionT ResetAction) noexcept
+KVI_CLIENT_API SaErrorT saHpiResourceResetStateSet(SaHpiSessionIdT SessionId,
+                                                   SaHpiResourceIdT ResourceId,
+                                                   SaHpiResetActionT ResetAction) noexcept
 {
     return call<KVI_RESOURCE_RESET_STATE_SET_REQ>(SessionId, ResourceId, ResetAction);
 }

@@ -7,7 +7,8 @@
 #include <stdint.h>
 #include <string.h>
 
-namespace {
+namespace
+{
 
 constexpr size_t RECORD_DATA = offsetof(SaHpiInventDataRecordT, RecordData);
 constexpr size_t CHASSIS_GENERAL = offsetof(SaHpiInventChassisDataT, GeneralData);
@@ -43,14 +44,15 @@ SaHpiInventDataRecordTypeT recordType(const void *Record) noexcept
 // list up to its NULL.
 void *const *textSlot(const char *General, size_t Index) noexcept
 {
-    return reinterpret_cast<void *const *>(General + offsetof(SaHpiInventGeneralDataT, Manufacturer) +
-                                          Index * PTR);
+    return reinterpret_cast<void *const *>(
+        General + offsetof(SaHpiInventGeneralDataT, Manufacturer) + Index * PTR);
 }
 
 // ---- Tree to wire ----
 
-class Flattener {
-public:
+class Flattener
+{
+  public:
     Flattener(const void *Bounds, size_t BoundsSize, char *Block, size_t Size) noexcept
         : bounds_(static_cast<const char *>(Bounds)), boundsSize_(BoundsSize), block_(Block),
           size_(Size)
@@ -73,7 +75,8 @@ public:
         }
         memcpy(block_ + at, Data, RECORDS);
         for (size_t i = 0; i < count; ++i) {
-            link(at + RECORDS + i * PTR, record(static_cast<const char *>(*slot(Data, RECORDS, i))));
+            link(at + RECORDS + i * PTR,
+                 record(static_cast<const char *>(*slot(Data, RECORDS, i))));
         }
         link(at + RECORDS + count * PTR, 0);
         return ok_ ? SA_OK : rc_;
@@ -81,18 +84,19 @@ public:
 
     size_t used() const noexcept { return used_; }
 
-private:
+  private:
     static void *const *slot(const void *Base, size_t Offset, size_t Index) noexcept
     {
-        return reinterpret_cast<void *const *>(static_cast<const char *>(Base) + Offset + Index * PTR);
+        return reinterpret_cast<void *const *>(static_cast<const char *>(Base) + Offset +
+                                               Index * PTR);
     }
 
     // Inside the plug-in's buffer, when there is one to stay inside of.
     bool inside(const void *At, size_t Bytes) noexcept
     {
         const char *p = static_cast<const char *>(At);
-        bool in = bounds_ == nullptr ||
-                  (p >= bounds_ && Bytes <= boundsSize_ && p - bounds_ <= ptrdiff_t(boundsSize_ - Bytes));
+        bool in = bounds_ == nullptr || (p >= bounds_ && Bytes <= boundsSize_ &&
+                                         p - bounds_ <= ptrdiff_t(boundsSize_ - Bytes));
         if (!in) {
             fail(SA_ERR_HPI_INVALID_DATA);
         }
@@ -149,9 +153,9 @@ private:
         if (!ok_ || !inside(Record, bytes)) {
             return 0;
         }
-        const size_t at = take(bytes < sizeof(SaHpiInventDataRecordT) ? sizeof(SaHpiInventDataRecordT)
-                                                                       : bytes,
-                               alignof(SaHpiInventDataRecordT));
+        const size_t at =
+            take(bytes < sizeof(SaHpiInventDataRecordT) ? sizeof(SaHpiInventDataRecordT) : bytes,
+                 alignof(SaHpiInventDataRecordT));
         if (!ok_) {
             return 0;
         }
@@ -186,8 +190,9 @@ private:
 
 // ---- Wire to tree ----
 
-class Relocator {
-public:
+class Relocator
+{
+  public:
     Relocator(char *Block, size_t Size) noexcept : block_(Block), size_(Size) {}
 
     bool head() noexcept
@@ -198,7 +203,8 @@ public:
         }
         for (size_t i = 0;; ++i) {
             char *record = nullptr;
-            if (!resolve(RECORDS + i * PTR, RECORD_DATA, alignof(SaHpiInventDataRecordT), &record)) {
+            if (!resolve(RECORDS + i * PTR, RECORD_DATA, alignof(SaHpiInventDataRecordT),
+                         &record)) {
                 return false;
             }
             if (record == nullptr) {
@@ -210,7 +216,7 @@ public:
         }
     }
 
-private:
+  private:
     bool fits(size_t At, size_t Bytes) const noexcept { return At <= size_ && size_ - At >= Bytes; }
 
     // Makes the pointer slot at Slot point into the block, checking that Bytes
@@ -257,7 +263,8 @@ private:
         }
         for (size_t i = 0;; ++i) {
             char *text = nullptr;
-            const size_t slot = at + general + offsetof(SaHpiInventGeneralDataT, Manufacturer) + i * PTR;
+            const size_t slot =
+                at + general + offsetof(SaHpiInventGeneralDataT, Manufacturer) + i * PTR;
             if (!resolve(slot, sizeof(SaHpiTextBufferT), alignof(SaHpiTextBufferT), &text)) {
                 return false;
             }

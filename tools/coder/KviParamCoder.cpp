@@ -6,18 +6,22 @@
 
 #include "kvi/KviNonVolatile.h"
 
-namespace {
+namespace
+{
 
 using Length = SaHpiUint16T;
 
-KviMsgHdr *header(void *Msg) noexcept { return static_cast<KviMsgHdr *>(Msg); }
+KviMsgHdr *header(void *Msg) noexcept
+{
+    return static_cast<KviMsgHdr *>(Msg);
+}
 
-SaErrorT pack(KviMsgTypeT Type, SaHpiUint8T *Msg, SaHpiUint32T *Position,
-              SaHpiUint32T *Remaining, const void *Data, SaHpiUint32T DataSize) noexcept
+SaErrorT pack(KviMsgTypeT Type, SaHpiUint8T *Msg, SaHpiUint32T *Position, SaHpiUint32T *Remaining,
+              const void *Data, SaHpiUint32T DataSize) noexcept
 {
     if (DataSize > 0xffff || *Remaining < sizeof(Length) + DataSize) {
-        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Message 0x%04x: %u bytes do not fit in %u", Type,
-                 DataSize, *Remaining);
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Message 0x%04x: %u bytes do not fit in %u", Type, DataSize,
+                 *Remaining);
         return SA_ERR_HPI_INVALID_DATA;
     }
     const Length length = static_cast<Length>(DataSize);
@@ -36,8 +40,8 @@ SaErrorT unpack(KviMsgTypeT Type, const SaHpiUint8T *Msg, SaHpiUint32T *Position
         memcpy(&length, Msg + *Position, sizeof length);
     }
     if (*Remaining < sizeof length || length != DataSize || *Remaining - sizeof length < length) {
-        KVI_DLOG(KVI_LOG_DBG_H, "Message 0x%04x: expected a %u-byte parameter, %u bytes left",
-                 Type, DataSize, *Remaining);
+        KVI_DLOG(KVI_LOG_DBG_H, "Message 0x%04x: expected a %u-byte parameter, %u bytes left", Type,
+                 DataSize, *Remaining);
         return SA_ERR_HPI_INVALID_DATA;
     }
     if (Data != nullptr) {
@@ -86,8 +90,8 @@ void kviWireSeal(void *Msg, SaHpiUint32T End) noexcept
     KviMsgHdr *h = header(Msg);
     const SaHpiUint32T start = kviWireHeaderSize(h->MsgType);
     h->MinHdr.Size = static_cast<SaHpiUint16T>(End);
-    h->Checksum = kviCsCrcGen(static_cast<SaHpiUint8T *>(Msg) + start,
-                              static_cast<SaHpiInt32T>(End - start));
+    h->Checksum =
+        kviCsCrcGen(static_cast<SaHpiUint8T *>(Msg) + start, static_cast<SaHpiInt32T>(End - start));
 }
 
 KviCommRetCode kviWireCheck(const void *Msg) noexcept
@@ -121,7 +125,7 @@ KviWireBody::KviWireBody(void *Msg, SaHpiUint32T Limit) noexcept
 void KviWireBody::code(KviOperationT Operation, void *Data, SaHpiUint32T Size) noexcept
 {
     if (ok_) {
-        ok_ = kviCpsCodeMsgData(type_, Operation, msg_, &position_, &remaining_, Data, Size) ==
-              SA_OK;
+        ok_ =
+            kviCpsCodeMsgData(type_, Operation, msg_, &position_, &remaining_, Data, Size) == SA_OK;
     }
 }

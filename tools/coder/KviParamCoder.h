@@ -28,8 +28,7 @@ enum : KviOperationT {
 };
 
 #define KVI_WIRE_MAX_MSG 65535u
-#define KVI_WIRE_LAYOUT_TAG                                                                        \
-    ((SaHpiUint8T)(sizeof(void *) | (alignof(SaHpiInt64T) << 4)))
+#define KVI_WIRE_LAYOUT_TAG ((SaHpiUint8T)(sizeof(void *) | (alignof(SaHpiInt64T) << 4)))
 
 /* Codes one parameter of a message of Type. Msg is the whole message,
  * Position the offset of the parameter, Remaining what is left of the
@@ -61,11 +60,15 @@ KviCommRetCode kviWireCheck(const void *Msg) noexcept;
 
 /* One body being written or read, over kviCpsCodeMsgData. A failed step
  * sticks: later steps do nothing and ok() stays false. */
-class KviWireBody {
-public:
+class KviWireBody
+{
+  public:
     KviWireBody(void *Msg, SaHpiUint32T Limit) noexcept;
 
-    void put(const void *Data, SaHpiUint32T Size) noexcept { code(KVI_OP_PACK, const_cast<void *>(Data), Size); }
+    void put(const void *Data, SaHpiUint32T Size) noexcept
+    {
+        code(KVI_OP_PACK, const_cast<void *>(Data), Size);
+    }
     void get(void *Data, SaHpiUint32T Size) noexcept { code(KVI_OP_UNPACK, Data, Size); }
     template <typename T> void put(const T &Value) noexcept { put(&Value, sizeof(T)); }
     template <typename T> void get(T &Value) noexcept { get(&Value, sizeof(T)); }
@@ -76,7 +79,7 @@ public:
     SaHpiUint32T end() const noexcept { return position_; }
     void *msg() const noexcept { return msg_; }
 
-private:
+  private:
     void code(KviOperationT Operation, void *Data, SaHpiUint32T Size) noexcept;
 
     void *msg_;

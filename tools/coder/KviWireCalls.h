@@ -123,11 +123,11 @@ template <typename... A> struct KviWireFn<SaErrorT (*)(A...) noexcept> {
 /* Where a parameter is held while its message is coded: the pointed-to
  * type of a pointer, the type itself otherwise. */
 template <typename A>
-using KviWireSlotT = std::conditional_t<
-    std::is_pointer_v<A>,
-    std::conditional_t<std::is_void_v<std::remove_pointer_t<A>>, char,
-                       std::remove_const_t<std::remove_pointer_t<A>>>,
-    A>;
+using KviWireSlotT =
+    std::conditional_t<std::is_pointer_v<A>,
+                       std::conditional_t<std::is_void_v<std::remove_pointer_t<A>>, char,
+                                          std::remove_const_t<std::remove_pointer_t<A>>>,
+                       A>;
 
 /* Sends the request's part of one parameter (client side). */
 template <char L, typename A> bool kviWirePutParam(KviWireBody &Body, A Arg) noexcept
@@ -204,7 +204,8 @@ bool kviWireServe(KviWireBody &In, KviWireBody &Out, SaErrorT *Result) noexcept
 {
     using Fn_ = KviWireFn<decltype(Fn)>;
     static_assert(sizeof(D.Letters) == Fn_::Count + 1, "one letter per parameter");
-    return [&]<size_t... I>(std::index_sequence<I...>) {
+    return [&]<size_t... I>(std::index_sequence<I...>)
+    {
         std::tuple<KviWireServerParam<D.Letters[I], std::tuple_element_t<I, typename Fn_::Args>>...>
             params;
         (std::get<I>(params).get(In), ...);
@@ -214,7 +215,8 @@ bool kviWireServe(KviWireBody &In, KviWireBody &Out, SaErrorT *Result) noexcept
         *Result = Fn(std::get<I>(params).arg()...);
         (std::get<I>(params).put(Out), ...);
         return Out.ok();
-    }(std::make_index_sequence<Fn_::Count>{});
+    }
+    (std::make_index_sequence<Fn_::Count>{});
 }
 
 /* The client's side of a generic call: fills the request body (false when
@@ -223,17 +225,21 @@ bool kviWireServe(KviWireBody &In, KviWireBody &Out, SaErrorT *Result) noexcept
 template <KviWireDirs D, typename... A> bool kviWirePutCall(KviWireBody &Body, A... Args) noexcept
 {
     static_assert(sizeof(D.Letters) == sizeof...(A) + 1, "one letter per parameter");
-    return [&]<size_t... I>(std::index_sequence<I...>) {
+    return [&]<size_t... I>(std::index_sequence<I...>)
+    {
         return (kviWirePutParam<D.Letters[I]>(Body, Args) && ...) && Body.ok();
-    }(std::index_sequence_for<A...>{});
+    }
+    (std::index_sequence_for<A...>{});
 }
 
 template <KviWireDirs D, typename... A>
 bool kviWireGetCall(KviWireBody &Body, bool Keep, A... Args) noexcept
 {
-    [&]<size_t... I>(std::index_sequence<I...>) {
+    [&]<size_t... I>(std::index_sequence<I...>)
+    {
         (kviWireGetParam<D.Letters[I]>(Body, Args, Keep), ...);
-    }(std::index_sequence_for<A...>{});
+    }
+    (std::index_sequence_for<A...>{});
     return Body.finished();
 }
 

@@ -20,7 +20,8 @@
 
 #include "KviHpid.h"
 
-namespace {
+namespace
+{
 
 constexpr const char *PROGRAM = "kvi-hpid";
 constexpr const char *DEFAULT_CONFIG = "/etc/kvi-hpid/kvi-hpid.conf";
@@ -55,12 +56,12 @@ void usage(FILE *To)
 int parseOptions(int argc, char **argv, Options *O)
 {
     static const option longOptions[] = {{"config", required_argument, nullptr, 'c'},
-                                          {"port", required_argument, nullptr, 'p'},
-                                          {"log", required_argument, nullptr, 'l'},
-                                          {"daemonize", no_argument, nullptr, 'd'},
-                                          {"help", no_argument, nullptr, 'h'},
-                                          {"version", no_argument, nullptr, 'v'},
-                                          {nullptr, 0, nullptr, 0}};
+                                         {"port", required_argument, nullptr, 'p'},
+                                         {"log", required_argument, nullptr, 'l'},
+                                         {"daemonize", no_argument, nullptr, 'd'},
+                                         {"help", no_argument, nullptr, 'h'},
+                                         {"version", no_argument, nullptr, 'v'},
+                                         {nullptr, 0, nullptr, 0}};
     int c;
     while ((c = getopt_long(argc, argv, "", longOptions, nullptr)) != -1) {
         char *end = nullptr;

@@ -13,7 +13,8 @@
 
 std::atomic<bool> kviHpidStopping{false};
 
-namespace {
+namespace
+{
 
 constexpr SaHpiInt32T READ_SLICE_MS = 1000;
 constexpr SaHpiUint32T WRITE_TIMEOUT_MS = 5000;
@@ -90,7 +91,8 @@ bool inventoryRead(KviWireBody &In, KviWireBody &Out, SaErrorT *Result)
     std::vector<AlignedBlock> blocks(2);
     SaHpiUint32T actual = 0;
     SaHpiUint32T used = 0;
-    const SaHpiUint32T size = bufferSize < KVI_WIRE_INVENTORY_MAX ? bufferSize : KVI_WIRE_INVENTORY_MAX;
+    const SaHpiUint32T size =
+        bufferSize < KVI_WIRE_INVENTORY_MAX ? bufferSize : KVI_WIRE_INVENTORY_MAX;
     auto *tree = reinterpret_cast<SaHpiInventoryDataT *>(blocks[0].Bytes);
     *Result = saHpiEntityInventoryDataRead(session, resource, eir, size, tree, &actual);
     if ((*Result == SA_OK || *Result == SA_ERR_HPI_DATA_LEN_INVALID) &&
@@ -148,7 +150,8 @@ KviCommRetCode serve(const KviMsgHdr *Header, void *Request, KviWireBody &Out, S
         return check;
     }
     const KviMsgTypeT type = Header->MsgType;
-    Handler handler = type <= KVI_CPS_LAST_MSG_TYPE && type % 2 == 0 ? handlers.Table[type] : nullptr;
+    Handler handler =
+        type <= KVI_CPS_LAST_MSG_TYPE && type % 2 == 0 ? handlers.Table[type] : nullptr;
     if (handler == nullptr) {
         KVI_DLOG(KVI_LOG_DBG_H, "No call for message type 0x%04x", type);
         return KVI_MSG_UNABLE_TO_PROCESS;
