@@ -589,10 +589,11 @@ TEST_F(HotSwapTest, RefusalsNameTheirCause)
         kviCsRptEntryAdd(0, bare, nullptr, SAHPI_TRUE, &none, kFakeMapl, &fakeLock_, &slotless),
         SA_OK);
     SaHpiHsStateT hs{};
-    SaHpiHsActionT action;
-    storeRaw(action, 2);
-    SaHpiHsIndicatorStateT led;
-    storeRaw(led, 2);
+    // A two-valued enum holds no other value in C++; a C caller passes one
+    // all the same, as these calls through the C signature do.
+    using RawSetT = SaErrorT (*)(SaHpiSessionIdT, SaHpiResourceIdT, SaHpiUint32T);
+    const auto action = reinterpret_cast<RawSetT>(saHpiHotSwapActionRequest);
+    const auto led = reinterpret_cast<RawSetT>(saHpiHotSwapIndicatorStateSet);
     SaHpiTimeoutT timeout = 0;
     const SaHpiEntityPathT nowhere{};
     const struct {
@@ -603,10 +604,8 @@ TEST_F(HotSwapTest, RefusalsNameTheirCause)
         {"not managed", saHpiHotSwapControlRequest(session_, fake_), SA_ERR_HPI_INVALID_CMD},
         {"NULL state", saHpiHotSwapStateGet(session_, tray, nullptr), SA_ERR_HPI_INVALID_PARAMS},
         {"NULL timeout", saHpiAutoInsertTimeoutGet(session_, nullptr), SA_ERR_HPI_INVALID_PARAMS},
-        {"action out of its enum", saHpiHotSwapActionRequest(session_, tray, action),
-         SA_ERR_HPI_INVALID_PARAMS},
-        {"indicator out of its enum", saHpiHotSwapIndicatorStateSet(session_, tray, led),
-         SA_ERR_HPI_INVALID_PARAMS},
+        {"action out of its enum", action(session_, tray, 2), SA_ERR_HPI_INVALID_PARAMS},
+        {"indicator out of its enum", led(session_, tray, 2), SA_ERR_HPI_INVALID_PARAMS},
         {"negative timeout", saHpiAutoExtractTimeoutSet(session_, tray, -2),
          SA_ERR_HPI_INVALID_PARAMS},
         {"negative domain timeout", saHpiAutoInsertTimeoutSet(session_, -2),
