@@ -19,6 +19,8 @@ struct KviShellNameTableT {
 
 extern const KviShellNameTableT kviShellErrorNames;
 extern const KviShellNameTableT kviShellEventCategoryNames;
+/* Keyed by (category << 16 | state bit); kviShellEventStates reads it. */
+extern const KviShellNameTableT kviShellEventStateNames;
 extern const KviShellNameTableT kviShellEntityTypeNames;
 extern const KviShellNameTableT kviShellSensorTypeNames;
 extern const KviShellNameTableT kviShellSensorInterpretedTypeNames;

@@ -220,14 +220,14 @@ std::string kviShellCapabilities(SaHpiCapabilitiesT Capabilities)
 
 std::string kviShellEventStates(SaHpiEventStateT States, SaHpiEventCategoryT Category)
 {
-    static const char *const thresholdStates[] = {"LOWER_MINOR", "LOWER_MAJOR", "LOWER_CRIT",
-                                                  "UPPER_MINOR", "UPPER_MAJOR", "UPPER_CRIT"};
-    if (Category != SAHPI_EC_THRESHOLD)
-        return format("0x%04X", States);
+    long long category = Category == SAHPI_EC_USER ? SAHPI_EC_GENERIC : Category;
     std::string out;
-    for (int bit = 0; bit < 6; bit++)
-        if (States & (1u << bit))
-            out += (out.empty() ? "" : "|") + std::string(thresholdStates[bit]);
+    for (int bit = 0; bit < 16; bit++) {
+        SaHpiEventStateT state = static_cast<SaHpiEventStateT>(1u << bit);
+        const char *name = kviShellNameOf(kviShellEventStateNames, category << 16 | state);
+        if (States & state)
+            out += (out.empty() ? "" : "|") + (name ? std::string(name) : format("0x%04X", state));
+    }
     return out.empty() ? "none" : out;
 }
 
