@@ -28,7 +28,7 @@ DEMO_SHELL := ./tools/shell/kvi-hpi-shell --config ../../examples/simulator.conf
 demo: build
 	rm -rf /tmp/kvi-simulator-nv
 	cd build/default && $(DEMO_SHELL) ../../examples/tour.hsh
-	@echo "== the library started anew: the saved tag and threshold are back"
+	@echo "== a second shell: a new process, the library started anew; the saved tag and threshold are back"
 	cd build/default && $(DEMO_SHELL) -e resources \
 	    -e "sensor thresholds {SYSTEM_CHASSIS,1}{PROCESSOR_BOARD,1} 1"
 

@@ -164,7 +164,10 @@ const KviShellCommandT kviShellSessionCommands[] = {
     {"events unsubscribe", 0, 0, "", "stop receiving events", unsubscribe},
     {"discover", 0, 0, "", "discover resources again", discover},
     {"schema", 0, 0, "", "the domain's entity schema", schema},
-    {"restart", 0, 0, "", "finalize the library and start it anew", restart},
+    {"restart", 0, 0, "",
+     "finalize and initialize the library in this process; resources get new ids, so settings "
+     "saved under the old ids are not restored (a new shell run restores them)",
+     restart},
     {"sim drive", 3, 3, "RID NUM RAW|release", "make a simulated sensor read RAW", simDrive},
     {"sim pull", 1, 1, "ENTITY-PATH", "pull a simulated board", simPull},
     {"sim insert", 1, 1, "ENTITY-PATH", "insert a simulated board", simInsert},
