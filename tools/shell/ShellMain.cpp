@@ -11,6 +11,7 @@
 #include <cstdio>
 #include <cstring>
 #include <fstream>
+#include <iostream>
 #include <string>
 #include <vector>
 
@@ -93,33 +94,44 @@ char **complete(const char *Text, int Start, int)
     return rl_completion_matches(Text, nextCandidate);
 }
 
-int interactive(KviShellT &Shell)
+// One line from the prompt, with history; false at the end of input.
+bool promptLine(std::string *Line)
+{
+    char *line = readline("hpi> ");
+    if (line == nullptr)
+        return false;
+    if (*line != '\0')
+        add_history(line);
+    *Line = line;
+    free(line);
+    return true;
+}
+
+void lineEditingSetUp(KviShellT &Shell)
 {
     completing = &Shell;
     rl_attempted_completion_function = complete;
-    bool quit = false;
-    while (!quit) {
-        char *line = readline("hpi> ");
-        if (line == nullptr)
-            break;
-        if (*line != '\0')
-            add_history(line);
-        kviShellRunLine(Shell, line, &quit);
-        free(line);
-    }
-    return 0;
 }
 #else
 // Without line editing (a build without libedit): plain lines.
-int interactive(KviShellT &Shell)
+bool promptLine(std::string *Line)
 {
+    fputs("hpi> ", stdout);
+    fflush(stdout);
+    return static_cast<bool>(std::getline(std::cin, *Line));
+}
+
+void lineEditingSetUp(KviShellT &) {}
+#endif
+
+void interactive(KviShellT &Shell)
+{
+    lineEditingSetUp(Shell);
     bool quit = false;
     std::string line;
-    while (!quit && (fputs("hpi> ", stdout), fflush(stdout), std::getline(std::cin, line)))
+    while (!quit && promptLine(&line))
         kviShellRunLine(Shell, line, &quit);
-    return 0;
 }
-#endif
 
 } // namespace
 
