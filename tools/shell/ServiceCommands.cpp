@@ -57,7 +57,7 @@ bool logEntries(KviShellT &Shell, const KviShellArgsT &Args)
         kviShellPrintEvent(sel.Event, &rdr, &rpt);
         count++;
     }
-    printf("%d entries\n", count);
+    printf("%d %s\n", count, count == 1 ? "entry" : "entries");
     return true;
 }
 

@@ -68,7 +68,7 @@ bool events(KviShellT &Shell, const KviShellArgsT &Args)
         got++;
     }
     sigaction(SIGINT, &previous, nullptr);
-    printf("%lld events\n", got);
+    printf("%lld %s\n", got, got == 1 ? "event" : "events");
     return kviShellCheck("saHpiEventGet", rc) && (count == 0 || got == count);
 }
 
