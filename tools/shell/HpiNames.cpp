@@ -59,7 +59,10 @@ const KviShellNameT categoryNames[] = {
 
 // Event states by category and bit, each as (category << 16 | bit). The user
 // category's states are the generic ones, looked up under SAHPI_EC_GENERIC.
-#define KVI_SHELL_ES(C, S) {static_cast<long long>(SAHPI_EC_##C) << 16 | SAHPI_ES_##S, #S}
+#define KVI_SHELL_ES(C, S)                                                                         \
+    {                                                                                              \
+        static_cast<long long>(SAHPI_EC_##C) << 16 | SAHPI_ES_##S, #S                              \
+    }
 const KviShellNameT eventStateNames[] = {
     KVI_SHELL_ES(THRESHOLD, LOWER_MINOR),
     KVI_SHELL_ES(THRESHOLD, LOWER_MAJOR),

@@ -10,7 +10,8 @@
 #include <sstream>
 #include <string>
 
-namespace {
+namespace
+{
 
 std::string readFile(const std::string &Path)
 {
@@ -23,9 +24,9 @@ std::string readFile(const std::string &Path)
 // The example configuration with a store of the test's own.
 std::string configFile()
 {
-    std::string config = std::regex_replace(readFile(KVI_SHELL_EXAMPLE),
-                                            std::regex("KviNvStorageDir = \"[^\"]*\""),
-                                            "KviNvStorageDir = \"/tmp/kvi-shell-test-nv\"");
+    std::string config =
+        std::regex_replace(readFile(KVI_SHELL_EXAMPLE), std::regex("KviNvStorageDir = \"[^\"]*\""),
+                           "KviNvStorageDir = \"/tmp/kvi-shell-test-nv\"");
     std::string path = "/tmp/kvi-shell-test.conf";
     std::ofstream(path) << config;
     return path;
