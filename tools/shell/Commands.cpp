@@ -197,17 +197,28 @@ bool kviShellRecord(KviShellT &Shell, SaHpiResourceIdT Rid, SaHpiRdrTypeT Type,
         return false;
     SaHpiEntryIdT entry = SAHPI_FIRST_ENTRY;
     while (entry != SAHPI_LAST_ENTRY &&
-           HPI(saHpiRdrGet, Shell.Session, Rid, entry, &entry, Rdr) == SA_OK) {
-        const SaHpiRdrTypeUnionT &u = Rdr->RdrTypeUnion;
-        long long has = Type == SAHPI_SENSOR_RDR      ? u.SensorRec.Num
-                        : Type == SAHPI_CTRL_RDR      ? u.CtrlRec.Num
-                        : Type == SAHPI_INVENTORY_RDR ? u.InventoryRec.EirId
-                                                      : u.WatchdogRec.WatchdogNum;
-        if (Rdr->RdrType == Type && has == num)
+           HPI(saHpiRdrGet, Shell.Session, Rid, entry, &entry, Rdr) == SA_OK)
+        if (Rdr->RdrType == Type && kviShellRecordNum(*Rdr) == num)
             return true;
-    }
     printf("%s: no %s %lld on resource %" PRIu32 "\n", kind, kind, num, Rid);
     return false;
+}
+
+SaHpiUint8T kviShellRecordNum(const SaHpiRdrT &Rdr)
+{
+    const SaHpiRdrTypeUnionT &u = Rdr.RdrTypeUnion;
+    switch (Rdr.RdrType) {
+    case SAHPI_SENSOR_RDR:
+        return u.SensorRec.Num;
+    case SAHPI_CTRL_RDR:
+        return u.CtrlRec.Num;
+    case SAHPI_INVENTORY_RDR:
+        return u.InventoryRec.EirId;
+    case SAHPI_WATCHDOG_RDR:
+        return u.WatchdogRec.WatchdogNum;
+    default:
+        return 0;
+    }
 }
 
 bool kviShellCheck(const char *Call, SaErrorT Rc, bool Always)

@@ -107,40 +107,50 @@ bool target(KviShellT &Shell, const KviShellArgsT &Args, SaHpiRdrTypeT Type, SaH
     return kviShellResource(Shell, Args[0], Rid) && kviShellRecord(Shell, *Rid, Type, Args[1], Rdr);
 }
 
-SaHpiSensorNumT sensorNum(const SaHpiRdrT &Rdr)
+SaHpiUint8T num(const SaHpiRdrT &Rdr)
 {
-    return Rdr.RdrTypeUnion.SensorRec.Num;
+    return kviShellRecordNum(Rdr);
+}
+
+// The get commands of a record: the record that Args name, read through the
+// HPI function Get (called Call in the result line), printed by Print.
+template <class ValueT, class GetT, class PrintT>
+bool recordRead(KviShellT &Shell, const KviShellArgsT &Args, SaHpiRdrTypeT Type, const char *Call,
+                GetT *Get, PrintT Print)
+{
+    SaHpiResourceIdT rid = 0;
+    SaHpiRdrT rdr;
+    ValueT value;
+    if (!target(Shell, Args, Type, &rid, &rdr) ||
+        !kviShellCheck(Call, kviShellHpiCall(Get, Shell.Session, rid, num(rdr), &value)))
+        return false;
+    Print(rdr, value);
+    return true;
 }
 
 bool sensorRead(KviShellT &Shell, const KviShellArgsT &Args)
 {
-    SaHpiResourceIdT rid = 0;
-    SaHpiRdrT rdr;
-    SaHpiSensorReadingT reading;
-    if (!target(Shell, Args, SAHPI_SENSOR_RDR, &rid, &rdr) ||
-        !kviShellCheck("saHpiSensorReadingGet",
-                       HPI(saHpiSensorReadingGet, Shell.Session, rid, sensorNum(rdr), &reading)))
-        return false;
-    const SaHpiSensorRecT &rec = rdr.RdrTypeUnion.SensorRec;
-    printf("%-22s %s", kviShellText(rdr.IdString).c_str(), kviShellReading(reading, &rdr).c_str());
-    if (reading.ValuesPresent & SAHPI_SRF_EVENT_STATE)
-        printf(", state %s",
-               kviShellEventStates(reading.EventStatus.EventStatus, rec.Category).c_str());
-    printf("\n");
-    return true;
+    return recordRead<SaHpiSensorReadingT>(
+        Shell, Args, SAHPI_SENSOR_RDR, "saHpiSensorReadingGet", kviShellHpi.saHpiSensorReadingGet,
+        [](const SaHpiRdrT &Rdr, const SaHpiSensorReadingT &Reading) {
+            printf("%-22s %s", kviShellText(Rdr.IdString).c_str(),
+                   kviShellReading(Reading, &Rdr).c_str());
+            if (Reading.ValuesPresent & SAHPI_SRF_EVENT_STATE)
+                printf(", state %s", kviShellEventStates(Reading.EventStatus.EventStatus,
+                                                         Rdr.RdrTypeUnion.SensorRec.Category)
+                                         .c_str());
+            printf("\n");
+        });
 }
 
 bool sensorThresholds(KviShellT &Shell, const KviShellArgsT &Args)
 {
-    SaHpiResourceIdT rid = 0;
-    SaHpiRdrT rdr;
-    SaHpiSensorThresholdsT thresholds;
-    if (!target(Shell, Args, SAHPI_SENSOR_RDR, &rid, &rdr) ||
-        !kviShellCheck("saHpiSensorThresholdsGet", HPI(saHpiSensorThresholdsGet, Shell.Session, rid,
-                                                       sensorNum(rdr), &thresholds)))
-        return false;
-    kviShellPrintThresholds(thresholds, rdr);
-    return true;
+    return recordRead<SaHpiSensorThresholdsT>(
+        Shell, Args, SAHPI_SENSOR_RDR, "saHpiSensorThresholdsGet",
+        kviShellHpi.saHpiSensorThresholdsGet,
+        [](const SaHpiRdrT &Rdr, const SaHpiSensorThresholdsT &Thresholds) {
+            kviShellPrintThresholds(Thresholds, Rdr);
+        });
 }
 
 SaHpiSensorReadingT *thresholdField(SaHpiSensorThresholdsT &T, const std::string &Name)
@@ -203,7 +213,7 @@ bool sensorThresholdSet(KviShellT &Shell, const KviShellArgsT &Args)
     SaHpiSensorThresholdsT current, change;
     if (!target(Shell, Args, SAHPI_SENSOR_RDR, &rid, &rdr) ||
         !kviShellCheck("saHpiSensorThresholdsGet",
-                       HPI(saHpiSensorThresholdsGet, Shell.Session, rid, sensorNum(rdr), &current)))
+                       HPI(saHpiSensorThresholdsGet, Shell.Session, rid, num(rdr), &current)))
         return false;
     // Only the named threshold is sent; the others stay as they are.
     memset(&change, 0, sizeof change);
@@ -212,7 +222,7 @@ bool sensorThresholdSet(KviShellT &Shell, const KviShellArgsT &Args)
         return false;
     *thresholdField(change, Args[2]) = *field;
     return kviShellCheck("saHpiSensorThresholdsSet",
-                         HPI(saHpiSensorThresholdsSet, Shell.Session, rid, sensorNum(rdr), &change),
+                         HPI(saHpiSensorThresholdsSet, Shell.Session, rid, num(rdr), &change),
                          true);
 }
 
@@ -225,9 +235,8 @@ bool sensorEnables(KviShellT &Shell, const KviShellArgsT &Args)
         return false;
     SaHpiEventCategoryT category = rdr.RdrTypeUnion.SensorRec.Category;
     if (Args.size() == 2) {
-        if (!kviShellCheck(
-                "saHpiSensorEventEnablesGet",
-                HPI(saHpiSensorEventEnablesGet, Shell.Session, rid, sensorNum(rdr), &enables)))
+        if (!kviShellCheck("saHpiSensorEventEnablesGet",
+                           HPI(saHpiSensorEventEnablesGet, Shell.Session, rid, num(rdr), &enables)))
             return false;
         printf("status 0x%02X, assert %s, deassert %s\n", enables.SensorStatus,
                kviShellEventStates(enables.AssertEvents, category).c_str(),
@@ -242,9 +251,9 @@ bool sensorEnables(KviShellT &Shell, const KviShellArgsT &Args)
     enables.SensorStatus = static_cast<SaHpiSensorStatusT>(status);
     enables.AssertEvents = static_cast<SaHpiEventStateT>(assert);
     enables.DeassertEvents = static_cast<SaHpiEventStateT>(deassert);
-    return kviShellCheck(
-        "saHpiSensorEventEnablesSet",
-        HPI(saHpiSensorEventEnablesSet, Shell.Session, rid, sensorNum(rdr), &enables), true);
+    return kviShellCheck("saHpiSensorEventEnablesSet",
+                         HPI(saHpiSensorEventEnablesSet, Shell.Session, rid, num(rdr), &enables),
+                         true);
 }
 
 bool sensorType(KviShellT &Shell, const KviShellArgsT &Args)
@@ -254,8 +263,8 @@ bool sensorType(KviShellT &Shell, const KviShellArgsT &Args)
     SaHpiSensorTypeT type;
     SaHpiEventCategoryT category = 0;
     if (!target(Shell, Args, SAHPI_SENSOR_RDR, &rid, &rdr) ||
-        !kviShellCheck("saHpiSensorTypeGet", HPI(saHpiSensorTypeGet, Shell.Session, rid,
-                                                 sensorNum(rdr), &type, &category)))
+        !kviShellCheck("saHpiSensorTypeGet",
+                       HPI(saHpiSensorTypeGet, Shell.Session, rid, num(rdr), &type, &category)))
         return false;
     const char *typeName = kviShellNameOf(kviShellSensorTypeNames, type);
     const char *categoryName = kviShellNameOf(kviShellEventCategoryNames, category);
@@ -276,15 +285,10 @@ bool sensorConvert(KviShellT &Shell, const KviShellArgsT &Args)
     input.ValuesPresent = SAHPI_SRF_RAW;
     input.Raw = static_cast<SaHpiUint32T>(raw);
     if (!kviShellCheck("saHpiSensorReadingConvert", HPI(saHpiSensorReadingConvert, Shell.Session,
-                                                        rid, sensorNum(rdr), &input, &converted)))
+                                                        rid, num(rdr), &input, &converted)))
         return false;
     printf("raw %lld = %s\n", raw, kviShellReading(converted, &rdr).c_str());
     return true;
-}
-
-SaHpiCtrlNumT ctrlNum(const SaHpiRdrT &Rdr)
-{
-    return Rdr.RdrTypeUnion.CtrlRec.Num;
 }
 
 bool controlGet(KviShellT &Shell, const KviShellArgsT &Args)
@@ -298,7 +302,7 @@ bool controlGet(KviShellT &Shell, const KviShellArgsT &Args)
         return false;
     state.Type = rdr.RdrTypeUnion.CtrlRec.Type;
     if (!kviShellCheck("saHpiControlStateGet",
-                       HPI(saHpiControlStateGet, Shell.Session, rid, ctrlNum(rdr), &state)))
+                       HPI(saHpiControlStateGet, Shell.Session, rid, num(rdr), &state)))
         return false;
     printf("%-22s ", kviShellText(rdr.IdString).c_str());
     kviShellPrintCtrlState(state);
@@ -381,21 +385,17 @@ bool controlSet(KviShellT &Shell, const KviShellArgsT &Args)
         !ctrlStateParse(rdr.RdrTypeUnion.CtrlRec.Type, Args, &state))
         return false;
     return kviShellCheck("saHpiControlStateSet",
-                         HPI(saHpiControlStateSet, Shell.Session, rid, ctrlNum(rdr), &state), true);
+                         HPI(saHpiControlStateSet, Shell.Session, rid, num(rdr), &state), true);
 }
 
 bool controlType(KviShellT &Shell, const KviShellArgsT &Args)
 {
-    SaHpiResourceIdT rid = 0;
-    SaHpiRdrT rdr;
-    SaHpiCtrlTypeT type;
-    if (!target(Shell, Args, SAHPI_CTRL_RDR, &rid, &rdr) ||
-        !kviShellCheck("saHpiControlTypeGet",
-                       HPI(saHpiControlTypeGet, Shell.Session, rid, ctrlNum(rdr), &type)))
-        return false;
-    const char *name = kviShellNameOf(kviShellCtrlTypeNames, type);
-    printf("type %s\n", name ? name : "?");
-    return true;
+    return recordRead<SaHpiCtrlTypeT>(
+        Shell, Args, SAHPI_CTRL_RDR, "saHpiControlTypeGet", kviShellHpi.saHpiControlTypeGet,
+        [](const SaHpiRdrT &, SaHpiCtrlTypeT Type) {
+            const char *name = kviShellNameOf(kviShellCtrlTypeNames, Type);
+            printf("type %s\n", name ? name : "?");
+        });
 }
 
 bool inventory(KviShellT &Shell, const KviShellArgsT &Args)
@@ -417,22 +417,11 @@ bool inventory(KviShellT &Shell, const KviShellArgsT &Args)
     return true;
 }
 
-SaHpiWatchdogNumT wdtNum(const SaHpiRdrT &Rdr)
-{
-    return Rdr.RdrTypeUnion.WatchdogRec.WatchdogNum;
-}
-
 bool watchdogGet(KviShellT &Shell, const KviShellArgsT &Args)
 {
-    SaHpiResourceIdT rid = 0;
-    SaHpiRdrT rdr;
-    SaHpiWatchdogT watchdog;
-    if (!target(Shell, Args, SAHPI_WATCHDOG_RDR, &rid, &rdr) ||
-        !kviShellCheck("saHpiWatchdogTimerGet",
-                       HPI(saHpiWatchdogTimerGet, Shell.Session, rid, wdtNum(rdr), &watchdog)))
-        return false;
-    kviShellPrintWatchdog(watchdog);
-    return true;
+    return recordRead<SaHpiWatchdogT>(
+        Shell, Args, SAHPI_WATCHDOG_RDR, "saHpiWatchdogTimerGet", kviShellHpi.saHpiWatchdogTimerGet,
+        [](const SaHpiRdrT &, const SaHpiWatchdogT &Watchdog) { kviShellPrintWatchdog(Watchdog); });
 }
 
 // One FIELD=VALUE of watchdog set into W.
@@ -478,14 +467,13 @@ bool watchdogSet(KviShellT &Shell, const KviShellArgsT &Args)
     SaHpiWatchdogT watchdog;
     if (!target(Shell, Args, SAHPI_WATCHDOG_RDR, &rid, &rdr) ||
         !kviShellCheck("saHpiWatchdogTimerGet",
-                       HPI(saHpiWatchdogTimerGet, Shell.Session, rid, wdtNum(rdr), &watchdog)))
+                       HPI(saHpiWatchdogTimerGet, Shell.Session, rid, num(rdr), &watchdog)))
         return false;
     for (size_t i = 2; i < Args.size(); i++)
         if (!watchdogField(watchdog, Args[i]))
             return false;
     return kviShellCheck("saHpiWatchdogTimerSet",
-                         HPI(saHpiWatchdogTimerSet, Shell.Session, rid, wdtNum(rdr), &watchdog),
-                         true);
+                         HPI(saHpiWatchdogTimerSet, Shell.Session, rid, num(rdr), &watchdog), true);
 }
 
 bool watchdogReset(KviShellT &Shell, const KviShellArgsT &Args)
@@ -494,7 +482,7 @@ bool watchdogReset(KviShellT &Shell, const KviShellArgsT &Args)
     SaHpiRdrT rdr;
     return target(Shell, Args, SAHPI_WATCHDOG_RDR, &rid, &rdr) &&
            kviShellCheck("saHpiWatchdogTimerReset",
-                         HPI(saHpiWatchdogTimerReset, Shell.Session, rid, wdtNum(rdr)), true);
+                         HPI(saHpiWatchdogTimerReset, Shell.Session, rid, num(rdr)), true);
 }
 
 } // namespace

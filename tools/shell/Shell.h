@@ -59,6 +59,8 @@ bool kviShellResource(KviShellT &Shell, const std::string &Arg, SaHpiResourceIdT
 /* The record of Type numbered Num on Rid; it must exist. */
 bool kviShellRecord(KviShellT &Shell, SaHpiResourceIdT Rid, SaHpiRdrTypeT Type,
                     const std::string &Num, SaHpiRdrT *Rdr);
+/* A record's number (sensor, control, inventory or watchdog), whatever its type. */
+SaHpiUint8T kviShellRecordNum(const SaHpiRdrT &Rdr);
 /* Prints the result line when Rc is not SA_OK, or when Always. */
 bool kviShellCheck(const char *Call, SaErrorT Rc, bool Always = false);
 
