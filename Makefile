@@ -23,12 +23,12 @@ $(addprefix check-,$(PRESETS)): check-%: deps
 	ctest --preset $*
 
 # The shell's tour of the simulated shelf, from the build directory, on a
-# fresh store; then the shell again, a new library, shows what the tour saved.
+# fresh store; then the shell again, a new library, shows what the tour set last.
 DEMO_SHELL := ./tools/shell/kvi-hpi-shell --config ../../examples/simulator.conf
 demo: build
 	rm -rf /tmp/kvi-simulator-nv
 	cd build/default && $(DEMO_SHELL) ../../examples/tour.hsh
-	@echo "== a second shell: a new process, the library started anew; the saved tag and threshold are back"
+	@echo "== a second shell: a new process, the library started anew; the tag and the threshold set last are back"
 	cd build/default && $(DEMO_SHELL) -e resources \
 	    -e "sensor thresholds {SYSTEM_CHASSIS,1}{PROCESSOR_BOARD,1} 1"
 

@@ -166,7 +166,7 @@ const KviShellCommandT kviShellSessionCommands[] = {
     {"schema", 0, 0, "", "the domain's entity schema", schema},
     {"restart", 0, 0, "",
      "finalize and initialize the library in this process; resources get new ids, so settings "
-     "saved under the old ids are not restored (a new shell run restores them)",
+     "kept under the old ids are not put back (a new shell run puts them back)",
      restart},
     {"sim drive", 3, 3, "RID NUM RAW|release", "make a simulated sensor read RAW", simDrive},
     {"sim pull", 1, 1, "ENTITY-PATH", "pull a simulated board", simPull},
