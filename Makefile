@@ -22,10 +22,15 @@ $(addprefix check-,$(PRESETS)): check-%: deps
 	cmake --build --preset $*
 	ctest --preset $*
 
-# The demo daemon on the simulated shelf, run twice from the build directory:
-# the second run shows the setting the first one saved.
+# The shell's tour of the simulated shelf, from the build directory, on a
+# fresh store; then the shell again, a new library, shows what the tour set last.
+DEMO_SHELL := ./tools/shell/kvi-hpi-shell --config ../../examples/simulator.conf
 demo: build
-	cd build/default && ./KviDemo ../../examples/simulator.conf && ./KviDemo ../../examples/simulator.conf
+	rm -rf /tmp/kvi-simulator-nv
+	cd build/default && $(DEMO_SHELL) ../../examples/tour.hsh
+	@echo "== a second shell: a new process, the library started anew; the tag and the threshold set last are back"
+	cd build/default && $(DEMO_SHELL) -e resources \
+	    -e "sensor thresholds {SYSTEM_CHASSIS,1}{PROCESSOR_BOARD,1} 1"
 
 bench: build
 	@for b in build/default/bench/*Bench; do echo "== $$b"; $$b || exit 1; done

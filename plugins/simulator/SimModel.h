@@ -171,7 +171,10 @@ struct SimHotSwapT {
     SaHpiHsStateT State;
     SaHpiHsIndicatorStateT Indicator;
     SaHpiTimeoutT AutoExtractTimeout;
-    SaHpiBoolT Managed; // a client asked to control hot swap
+    SaHpiBoolT Counting;    // the pending state's policy runs at DeadlineNs
+    SaHpiInt64T DeadlineNs; // on the hot-swap clock (simHotSwapNowNs)
+    SaHpiBoolT Pulled;      // the latch is open: the board goes once inactive
+    SaHpiBoolT Departing;   // NOT_PRESENT: to be taken out of the RPT
 };
 
 struct SimResourceT {
@@ -185,6 +188,8 @@ struct SimResourceT {
     SaHpiUint32T ResetCount;
     SaHpiUint32T PowerCycles;
     SimHotSwapT HotSwap;
+    SaHpiBoolT Departed;        // out of the registry, kept until finalization
+    SimResourceT *NextDeparted; // the chain of departed resources
     SimEventLogT Log;
     SaHpiUint32T RecordCount;
     SimRecordT *Records; // in the same block, after this structure
@@ -273,8 +278,14 @@ SaErrorT simWithRecord(void *UserData, SaHpiRdrTypeT Type, Body body) noexcept
 SimResourceT *simFindResource(SaHpiResourceIdT ResourceId) noexcept;
 SaHpiInt64T simMonotonicMs() noexcept;
 SaHpiTimeT simNow() noexcept;
-// Tells the countdown thread that a watchdog started.
-void simWatchdogStarted() noexcept;
+// Tells the countdown thread that a watchdog or a hot-swap countdown started.
+void simCountdownStarted() noexcept;
+// The clock of the hot-swap countdowns, in nanoseconds: the machine's
+// monotonic clock until a test takes it over (kviSimClockAdvance).
+SaHpiInt64T simHotSwapNowNs() noexcept;
+// Takes a resource that reached NOT_PRESENT out of the registry and the RPT.
+// Called without the resource's mutex, which the removal takes.
+void simDepartIfDue(SimResourceT *Resource) noexcept;
 // A text buffer in English.
 void simText(SaHpiTextBufferT *Buffer, const char *Text) noexcept;
 
@@ -290,11 +301,16 @@ extern KviDsRdrFnTable simRdrFnTables[SIM_RDR_TYPES];
 SaHpiBoolT simIsRunning(const SimResourceT *Resource) noexcept;
 void simResourceInitialize(SimResourceT *Resource) noexcept;
 void simResourceDefaults(SimResourceT *Resource) noexcept;
+// Hot swap: runs the policy of a pending state whose countdown is over and
+// returns whether a countdown still runs; the operator's pull and insertion.
+SaHpiBoolT simHotSwapTick(SimResourceT *Resource, SaHpiInt64T NowNs) noexcept;
+SaErrorT simHotSwapPull(SimResourceT *Resource) noexcept;
+void simHotSwapInserted(SimResourceT *Resource) noexcept;
 
 // Event log (SimEventLog.cpp): records an event of the resource in its log
 // when the log is enabled, and posts it to the library's event queue. Sensor
-// state changes and watchdog actions come through here; hot-swap state
-// changes (SimResource.cpp) will too, once hot swap posts events.
+// state changes, watchdog actions and hot-swap state changes come through
+// here.
 void simPublishEvent(SimResourceT *Resource, SaHpiEventT *Event) noexcept;
 void simEventLogRelease(SimEventLogT *Log) noexcept;
 

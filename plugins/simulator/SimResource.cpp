@@ -1,7 +1,6 @@
-// Resource-wide state: power, reset and the hot-swap slots. The library
-// serves power and reset calls; the hot-swap slots are reserved by it, and
-// the simulator still keeps them stateful so that a later front end finds a
-// plug-in that answers them.
+// Resource-wide state: power, reset and hot swap.
+#include <cstdint>
+
 #include "SimModel.h"
 
 namespace
@@ -18,21 +17,136 @@ void stopWatchdogs(SimResourceT &Resource) noexcept
     }
 }
 
-// A client managing hot swap completes a pending insertion or extraction.
-// Hot-swap state changes post no events yet: when they do, each change here
-// and in simHotSwapActionRequest goes to simPublishEvent as a SAHPI_ET_HOTSWAP
-// event with the previous state.
-SaErrorT completePending(void *UserDefined, SaHpiHsStateT Target) noexcept
+// ---- The hot-swap state machine ----
+//
+// A FRU's pending state runs its default policy when its countdown ends: the
+// domain's auto-insert timeout or the resource's auto-extract timeout, as it
+// stood when the state was entered. A client that takes control stops the
+// countdown and decides with ResourceActiveSet or ResourceInactiveSet. The
+// insertion policy powers the board and puts its indicator out; the
+// extraction policy powers it off and lights the indicator, which tells the
+// operator that the board may go. Every change posts a SAHPI_ET_HOTSWAP event.
+
+bool isActive(SaHpiHsStateT State) noexcept
 {
-    return simWithResource(UserDefined, [&](SimResourceT &R) {
-        SimHotSwapT &hs = R.HotSwap;
-        if (!hs.Managed || (hs.State != SAHPI_HS_STATE_INSERTION_PENDING &&
-                            hs.State != SAHPI_HS_STATE_EXTRACTION_PENDING)) {
+    return State == SAHPI_HS_STATE_ACTIVE_HEALTHY || State == SAHPI_HS_STATE_ACTIVE_UNHEALTHY;
+}
+
+bool isPending(SaHpiHsStateT State) noexcept
+{
+    return State == SAHPI_HS_STATE_INSERTION_PENDING || State == SAHPI_HS_STATE_EXTRACTION_PENDING;
+}
+
+// An active board that does not run (held in reset, powered off or
+// inhibited by a client) is unhealthy.
+SaHpiHsStateT activeState(const SimResourceT &R) noexcept
+{
+    return simIsRunning(&R) ? SAHPI_HS_STATE_ACTIVE_HEALTHY : SAHPI_HS_STATE_ACTIVE_UNHEALTHY;
+}
+
+void publishHotSwap(SimResourceT &R, SaHpiHsStateT Previous) noexcept
+{
+    SaHpiEventT event;
+    memset(&event, 0, sizeof(event));
+    event.Source = R.ResourceId;
+    event.EventType = SAHPI_ET_HOTSWAP;
+    event.Timestamp = simNow();
+    event.Severity = R.Shape->Severity;
+    event.EventDataUnion.HotSwapEvent.HotSwapState = R.HotSwap.State;
+    event.EventDataUnion.HotSwapEvent.PreviousHotSwapState = Previous;
+    simPublishEvent(&R, &event);
+}
+
+void enter(SimResourceT &R, SaHpiHsStateT State) noexcept;
+
+void powerOff(SimResourceT &R) noexcept
+{
+    R.PowerState = SAHPI_HS_POWER_OFF;
+    stopWatchdogs(R);
+}
+
+void activate(SimResourceT &R) noexcept
+{
+    R.PowerState = SAHPI_HS_POWER_ON;
+    R.HotSwap.Indicator = SAHPI_HS_INDICATOR_OFF;
+    R.HotSwap.Pulled = SAHPI_FALSE; // an extraction refused: the latch is closed again
+    enter(R, activeState(R));
+}
+
+void deactivate(SimResourceT &R) noexcept
+{
+    powerOff(R);
+    R.HotSwap.Indicator = SAHPI_HS_INDICATOR_ON;
+    enter(R, SAHPI_HS_STATE_INACTIVE);
+}
+
+void runPolicy(SimResourceT &R) noexcept
+{
+    if (R.HotSwap.State == SAHPI_HS_STATE_INSERTION_PENDING) {
+        activate(R);
+    } else {
+        deactivate(R);
+    }
+}
+
+void startPolicy(SimResourceT &R) noexcept
+{
+    SimHotSwapT &hs = R.HotSwap;
+    SaHpiTimeoutT timeout = hs.AutoExtractTimeout;
+    if (hs.State == SAHPI_HS_STATE_INSERTION_PENDING &&
+        kviCsAutoInsertTimeoutGet(R.DomainId, &timeout) != SA_OK) {
+        timeout = SAHPI_TIMEOUT_BLOCK; // leave it to a client
+    }
+    if (timeout == SAHPI_TIMEOUT_IMMEDIATE) {
+        runPolicy(R);
+    } else if (timeout != SAHPI_TIMEOUT_BLOCK) {
+        const SaHpiInt64T now = simHotSwapNowNs();
+        hs.DeadlineNs = timeout > INT64_MAX - now ? INT64_MAX : now + timeout;
+        hs.Counting = SAHPI_TRUE;
+        simCountdownStarted();
+    }
+}
+
+void enter(SimResourceT &R, SaHpiHsStateT State) noexcept
+{
+    SimHotSwapT &hs = R.HotSwap;
+    const SaHpiHsStateT previous = hs.State;
+    hs.State = State;
+    hs.Counting = SAHPI_FALSE;
+    simSensorsEvaluate(&R);
+    publishHotSwap(R, previous);
+    if (State == SAHPI_HS_STATE_NOT_PRESENT) {
+        hs.Departing = SAHPI_TRUE;
+    } else if (State == SAHPI_HS_STATE_INACTIVE && hs.Pulled) {
+        enter(R, SAHPI_HS_STATE_NOT_PRESENT);
+    } else if (isPending(State)) {
+        startPolicy(R);
+    }
+}
+
+// ResourceActiveSet and ResourceInactiveSet decide a pending state, whether
+// its countdown still runs or a client stopped it.
+SaErrorT decidePending(void *UserDefined, void (*Decide)(SimResourceT &)) noexcept
+{
+    SaErrorT rc = simWithResource(UserDefined, [&](SimResourceT &R) {
+        if (!isPending(R.HotSwap.State)) {
             return SA_ERR_HPI_INVALID_REQUEST;
         }
-        hs.State = Target;
+        Decide(R);
         return SA_OK;
     });
+    if (rc == SA_OK) {
+        simDepartIfDue(static_cast<SimResourceT *>(UserDefined));
+    }
+    return rc;
+}
+
+// An active board turns unhealthy when it stops running, and healthy again.
+void followHealth(SimResourceT &R) noexcept
+{
+    if (isActive(R.HotSwap.State) && activeState(R) != R.HotSwap.State) {
+        enter(R, activeState(R));
+    }
 }
 
 } // namespace
@@ -55,7 +169,6 @@ void simResourceInitialize(SimResourceT *Resource) noexcept
     Resource->PowerState = SAHPI_HS_POWER_ON;
     Resource->ResetAsserted = SAHPI_FALSE;
     Resource->HotSwap.State = SAHPI_HS_STATE_ACTIVE_HEALTHY;
-    Resource->HotSwap.Managed = SAHPI_FALSE;
     Resource->Log.NextId = 1;
     Resource->Log.UpdateTimestamp = SAHPI_TIME_UNSPECIFIED;
     simResourceDefaults(Resource);
@@ -98,6 +211,7 @@ SaErrorT simResourcePowerStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiHsPower
             stopWatchdogs(R);
         }
         simSensorsEvaluate(&R);
+        followHealth(R);
         return SA_OK;
     });
 }
@@ -137,32 +251,67 @@ SaErrorT simResourceResetStateSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiResetAc
             stopWatchdogs(R);
         }
         simSensorsEvaluate(&R);
+        followHealth(R);
         return SA_OK;
     });
 }
 
-// ---- Hot swap ----
-//
-// A resource is active until a client asks for its extraction; with hot-swap
-// control taken by the client the pending states wait for ResourceActiveSet
-// or ResourceInactiveSet, otherwise they complete at once.
+// ---- Hot swap: the model ----
+
+SaHpiBoolT simHotSwapTick(SimResourceT *Resource, SaHpiInt64T NowNs) noexcept
+{
+    if (Resource->HotSwap.Counting && NowNs >= Resource->HotSwap.DeadlineNs) {
+        runPolicy(*Resource);
+    }
+    return Resource->HotSwap.Counting;
+}
+
+// The operator opens the latch and pulls the board as soon as it may: an
+// active board asks for its extraction first and goes once it is inactive;
+// a board that is not active goes at once.
+SaErrorT simHotSwapPull(SimResourceT *Resource) noexcept
+{
+    SimHotSwapT &hs = Resource->HotSwap;
+    if (hs.Pulled || hs.State == SAHPI_HS_STATE_NOT_PRESENT) {
+        return SA_ERR_HPI_INVALID_REQUEST;
+    }
+    hs.Pulled = SAHPI_TRUE;
+    if (isActive(hs.State)) {
+        enter(*Resource, SAHPI_HS_STATE_EXTRACTION_PENDING);
+    } else if (hs.State != SAHPI_HS_STATE_EXTRACTION_PENDING) {
+        powerOff(*Resource);
+        enter(*Resource, SAHPI_HS_STATE_NOT_PRESENT);
+    }
+    return SA_OK;
+}
+
+// A board just registered as inserted, unpowered, with its latch closed.
+void simHotSwapInserted(SimResourceT *Resource) noexcept
+{
+    enter(*Resource, SAHPI_HS_STATE_INSERTION_PENDING);
+}
+
+// ---- Hot swap: the slots ----
 
 SaErrorT simHotSwapControlRequest(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined) noexcept
 {
     return simWithResource(UserDefined, [](SimResourceT &R) {
-        R.HotSwap.Managed = SAHPI_TRUE;
+        if (!isPending(R.HotSwap.State)) {
+            return SA_ERR_HPI_INVALID_REQUEST;
+        }
+        R.HotSwap.Counting = SAHPI_FALSE;
         return SA_OK;
     });
 }
 
 SaErrorT simResourceActiveSet(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined) noexcept
 {
-    return completePending(UserDefined, SAHPI_HS_STATE_ACTIVE_HEALTHY);
+    return decidePending(UserDefined, activate);
 }
 
 SaErrorT simResourceInactiveSet(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined) noexcept
 {
-    return completePending(UserDefined, SAHPI_HS_STATE_INACTIVE);
+    return decidePending(UserDefined, deactivate);
 }
 
 SaErrorT simAutoExtractTimeoutGet(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDefined,
@@ -172,6 +321,7 @@ SaErrorT simAutoExtractTimeoutGet(SaHpiDomainIdT, SaHpiResourceIdT, void *UserDe
                            [](const SimResourceT &R) { return R.HotSwap.AutoExtractTimeout; });
 }
 
+// A new timeout counts from the next extraction; one running goes on.
 SaErrorT simAutoExtractTimeoutSet(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiTimeoutT Timeout,
                                   void *UserDefined) noexcept
 {
@@ -195,21 +345,19 @@ SaErrorT simHotSwapActionRequest(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiHsAction
                                  void *UserDefined) noexcept
 {
     return simWithResource(UserDefined, [&](SimResourceT &R) {
-        SimHotSwapT &hs = R.HotSwap;
+        const SaHpiHsStateT state = R.HotSwap.State;
         switch (simRaw(Action)) {
         case SAHPI_HS_ACTION_INSERTION:
-            if (hs.State != SAHPI_HS_STATE_INACTIVE) {
+            if (state != SAHPI_HS_STATE_INACTIVE) {
                 return SA_ERR_HPI_INVALID_REQUEST;
             }
-            hs.State =
-                hs.Managed ? SAHPI_HS_STATE_INSERTION_PENDING : SAHPI_HS_STATE_ACTIVE_HEALTHY;
+            enter(R, SAHPI_HS_STATE_INSERTION_PENDING);
             return SA_OK;
         case SAHPI_HS_ACTION_EXTRACTION:
-            if (hs.State != SAHPI_HS_STATE_ACTIVE_HEALTHY &&
-                hs.State != SAHPI_HS_STATE_ACTIVE_UNHEALTHY) {
+            if (!isActive(state)) {
                 return SA_ERR_HPI_INVALID_REQUEST;
             }
-            hs.State = hs.Managed ? SAHPI_HS_STATE_EXTRACTION_PENDING : SAHPI_HS_STATE_INACTIVE;
+            enter(R, SAHPI_HS_STATE_EXTRACTION_PENDING);
             return SA_OK;
         default:
             return SA_ERR_HPI_INVALID_PARAMS;

@@ -246,6 +246,10 @@ constexpr SaHpiCapabilitiesT COMMON_CAPABILITIES =
     SAHPI_CAPABILITY_RESOURCE | SAHPI_CAPABILITY_RDR | SAHPI_CAPABILITY_SENSOR |
     SAHPI_CAPABILITY_CONTROL | SAHPI_CAPABILITY_INVENTORY_DATA | SAHPI_CAPABILITY_SEL |
     SAHPI_CAPABILITY_CONFIGURATION | SAHPI_CAPABILITY_EVT_DEASSERTS;
+// Boards, fan trays and supplies are pulled and inserted under a client's
+// control: the managed hot-swap model.
+constexpr SaHpiCapabilitiesT FRU_CAPABILITIES =
+    SAHPI_CAPABILITY_FRU | SAHPI_CAPABILITY_MANAGED_HOTSWAP;
 
 template <size_t N> constexpr SaHpiUint32T count(const SimRecordShapeT (&)[N])
 {
@@ -256,14 +260,12 @@ const SimResourceShapeT ResourceShapes[SIM_KIND_COUNT] = {
     {SIM_CHASSIS, "Chassis %u", SAHPI_ENT_SYSTEM_CHASSIS, COMMON_CAPABILITIES, SAHPI_CRITICAL,
      ChassisRecords, count(ChassisRecords)},
     {SIM_PROCESSOR_BOARD, "Processor board %u", SAHPI_ENT_PROCESSOR_BOARD,
-     COMMON_CAPABILITIES | SAHPI_CAPABILITY_WATCHDOG | SAHPI_CAPABILITY_FRU, SAHPI_MAJOR,
-     BoardRecords, count(BoardRecords)},
-    {SIM_FAN_TRAY, "Fan tray %u", SAHPI_ENT_COOLING_UNIT,
-     COMMON_CAPABILITIES | SAHPI_CAPABILITY_FRU, SAHPI_MAJOR, FanTrayRecords,
-     count(FanTrayRecords)},
+     COMMON_CAPABILITIES | SAHPI_CAPABILITY_WATCHDOG | FRU_CAPABILITIES, SAHPI_MAJOR, BoardRecords,
+     count(BoardRecords)},
+    {SIM_FAN_TRAY, "Fan tray %u", SAHPI_ENT_COOLING_UNIT, COMMON_CAPABILITIES | FRU_CAPABILITIES,
+     SAHPI_MAJOR, FanTrayRecords, count(FanTrayRecords)},
     {SIM_POWER_SUPPLY, "Power supply %u", SAHPI_ENT_POWER_SUPPLY,
-     COMMON_CAPABILITIES | SAHPI_CAPABILITY_FRU, SAHPI_CRITICAL, SupplyRecords,
-     count(SupplyRecords)},
+     COMMON_CAPABILITIES | FRU_CAPABILITIES, SAHPI_CRITICAL, SupplyRecords, count(SupplyRecords)},
 };
 
 } // namespace

@@ -25,7 +25,7 @@ void start(SimWatchdogStateT &W) noexcept
     W.Running = SAHPI_TRUE;
     W.PreTimeoutFired = SAHPI_FALSE;
     W.DeadlineMs = simMonotonicMs() + W.Config.InitialCount;
-    simWatchdogStarted();
+    simCountdownStarted();
 }
 
 void defaults(SimWatchdogStateT &W) noexcept

@@ -4,6 +4,7 @@
 // initialisation table, the configuration, the registry of resources,
 // discovery, the watchdog countdown thread and the two function tables.
 #include <cerrno>
+#include <cstdint>
 #include <cstdio>
 #include <cstring>
 #include <ctime>
@@ -50,6 +51,18 @@ SaHpiUint32T Sizes[SIM_KEY_COUNT];
 SimResourceT **Resources = nullptr;
 SaHpiUint32T ResourceCount = 0;
 SaHpiUint32T ResourceCapacity = 0;
+// Hot swap: one flag per FRU place of the shelf (in the block of Resources),
+// true while a board sits there; the boards pulled since initialization,
+// kept because a client call may still hold their pointer.
+SaHpiBoolT *Present = nullptr;
+SimResourceT *DepartedList = nullptr;
+SaHpiDomainIdT ShelfDomain = SAHPI_DEFAULT_DOMAIN_ID;
+SaHpiUint32T LockCount = 0;
+
+// The hot-swap clock; a test that takes it over moves it by hand.
+pthread_mutex_t ClockMutex = PTHREAD_MUTEX_INITIALIZER;
+SaHpiBoolT ManualClock = SAHPI_FALSE;
+SaHpiInt64T ManualNowNs = 0;
 
 // The countdown thread wakes every tick while a watchdog runs and otherwise
 // sleeps until one starts or the plug-in is finalized.
@@ -74,6 +87,97 @@ SaHpiUint32T readSize(const SimSizeKeyT &Key) noexcept
         return Key.Default;
     }
     return value;
+}
+
+SaHpiInt64T monotonicNs() noexcept
+{
+    struct timespec now;
+    clock_gettime(CLOCK_MONOTONIC, &now);
+    return static_cast<SaHpiInt64T>(now.tv_sec) * 1000000000 + now.tv_nsec;
+}
+
+SaHpiUint32T countOf(SimKindT Kind) noexcept
+{
+    const SaHpiUint32T counts[SIM_KIND_COUNT] = {1, Sizes[SIM_KEY_BOARDS], Sizes[SIM_KEY_FAN_TRAYS],
+                                                 Sizes[SIM_KEY_SUPPLIES]};
+    return counts[Kind];
+}
+
+// The place of a resource of the shelf in Present: kinds in order, then
+// instances.
+SaHpiUint32T placeOf(SimKindT Kind, SaHpiUint32T Instance) noexcept
+{
+    SaHpiUint32T place = Instance - 1;
+    for (SaHpiUint32T kind = 0; kind < Kind; kind++) {
+        place += countOf(static_cast<SimKindT>(kind));
+    }
+    return place;
+}
+
+SaHpiUint32T placeOf(const SimResourceT *Resource) noexcept
+{
+    return placeOf(Resource->Shape->Kind, Resource->Instance);
+}
+
+// Takes a resource out of the table of resources; Registry held.
+SaHpiBoolT takeOut(SimResourceT *Resource) noexcept
+{
+    for (SaHpiUint32T i = 0; i < ResourceCount; i++) {
+        if (Resources[i] == Resource) {
+            Resources[i] = Resources[--ResourceCount];
+            return SAHPI_TRUE;
+        }
+    }
+    return SAHPI_FALSE;
+}
+
+// A board that reached NOT_PRESENT leaves the registry for the departed
+// chain, then the RPT, whose removal slot leaves it there.
+void departResource(SimResourceT *Resource) noexcept
+{
+    pthread_mutex_lock(&Registry);
+    const SaHpiBoolT mine = takeOut(Resource);
+    if (mine) {
+        Resource->Departed = SAHPI_TRUE;
+        Resource->NextDeparted = DepartedList;
+        DepartedList = Resource;
+        Present[placeOf(Resource)] = SAHPI_FALSE;
+    }
+    pthread_mutex_unlock(&Registry);
+    if (!mine) {
+        return; // another thread took it out
+    }
+    SaErrorT rc = kviCsRptEntryRemoveByRid(Resource->DomainId, Resource->ResourceId);
+    if (rc != SA_OK) {
+        KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Simulator: removing rid=%u failed. rc=%d",
+                 Resource->ResourceId, rc);
+    }
+}
+
+// Runs the hot-swap countdowns that are due, taking out the boards that
+// left; returns whether a countdown still runs.
+SaHpiBoolT hotSwapTick() noexcept
+{
+    const SaHpiInt64T now = simHotSwapNowNs();
+    for (;;) {
+        SaHpiBoolT counting = SAHPI_FALSE;
+        SimResourceT *gone = nullptr;
+        pthread_mutex_lock(&Registry);
+        for (SaHpiUint32T i = 0; i < ResourceCount && gone == nullptr; i++) {
+            SimLock lock(Resources[i]);
+            if (simHotSwapTick(Resources[i], now)) {
+                counting = SAHPI_TRUE;
+            }
+            if (Resources[i]->HotSwap.Departing) {
+                gone = Resources[i];
+            }
+        }
+        pthread_mutex_unlock(&Registry);
+        if (gone == nullptr) {
+            return counting;
+        }
+        departResource(gone);
+    }
 }
 
 void wakeTicker() noexcept
@@ -121,6 +225,9 @@ void *tickerMain(void *) noexcept
             }
         }
         pthread_mutex_unlock(&Registry);
+        if (hotSwapTick()) {
+            anyRunning = SAHPI_TRUE;
+        }
 
         pthread_mutex_lock(&TickMutex);
     }
@@ -186,14 +293,7 @@ void releaseResource(SimResourceT *Resource) noexcept
 SaHpiBoolT unregisterResource(SimResourceT *Resource) noexcept
 {
     pthread_mutex_lock(&Registry);
-    SaHpiBoolT found = SAHPI_FALSE;
-    for (SaHpiUint32T i = 0; i < ResourceCount; i++) {
-        if (Resources[i] == Resource) {
-            Resources[i] = Resources[--ResourceCount];
-            found = SAHPI_TRUE;
-            break;
-        }
-    }
+    SaHpiBoolT found = takeOut(Resource);
     pthread_mutex_unlock(&Registry);
     return found;
 }
@@ -262,13 +362,13 @@ SimResourceT *allocateResource(const SimResourceShapeT *Shape, SaHpiUint32T Inst
     return resource;
 }
 
-void entityPath(const SimResourceT *Resource, SaHpiEntityPathT *Path) noexcept
+void entityPath(SimKindT Kind, SaHpiUint32T Instance, SaHpiEntityPathT *Path) noexcept
 {
     memset(Path, 0, sizeof(*Path));
     SaHpiUint32T n = 0;
-    if (Resource->Shape->Kind != SIM_CHASSIS) {
-        Path->Entry[n].EntityType = Resource->Shape->Entity;
-        Path->Entry[n].EntityInstance = Resource->Instance;
+    if (Kind != SIM_CHASSIS) {
+        Path->Entry[n].EntityType = simResourceShape(Kind)->Entity;
+        Path->Entry[n].EntityInstance = Instance;
         n++;
     }
     Path->Entry[n].EntityType = SAHPI_ENT_SYSTEM_CHASSIS;
@@ -289,7 +389,7 @@ void buildRptEntry(const SimResourceT *Resource, SaHpiDomainIdT DomainId,
     Entry->ResourceInfo.ProductId = static_cast<SaHpiUint16T>(0x5100 + shape->Kind);
     Entry->ResourceInfo.FirmwareMajorRev = 1;
     Entry->ResourceInfo.FirmwareMinorRev = 0;
-    entityPath(Resource, &Entry->ResourceEntity);
+    entityPath(shape->Kind, Resource->Instance, &Entry->ResourceEntity);
     Entry->ResourceCapabilities = shape->Capabilities;
     Entry->ResourceSeverity = shape->Severity;
     Entry->DomainId = DomainId;
@@ -302,7 +402,7 @@ void buildRdr(const SimRecordT *Record, SaHpiRdrT *Rdr) noexcept
 {
     memset(Rdr, 0, sizeof(*Rdr));
     Rdr->RdrType = Record->Type;
-    entityPath(Record->Resource, &Rdr->Entity);
+    entityPath(Record->Resource->Shape->Kind, Record->Resource->Instance, &Rdr->Entity);
     char id[SAHPI_MAX_TEXT_BUFFER_LENGTH + 1] = "";
     switch (Record->Type) {
     case SAHPI_SENSOR_RDR:
@@ -403,6 +503,13 @@ SaErrorT registerResource(SaHpiDomainIdT DomainId, SimResourceT *Resource,
     return rc;
 }
 
+void markPresent(SimKindT Kind, SaHpiUint32T Instance, SaHpiBoolT IsPresent) noexcept
+{
+    pthread_mutex_lock(&Registry);
+    Present[placeOf(Kind, Instance)] = IsPresent;
+    pthread_mutex_unlock(&Registry);
+}
+
 // The plug-in's locks, handed out round robin over the resources.
 SaHpiUint32T countLocks() noexcept
 {
@@ -437,14 +544,16 @@ SaErrorT simMaplInitialization(SaHpiUint32T Num) noexcept
     }
     ResourceCapacity =
         1 + Sizes[SIM_KEY_BOARDS] + Sizes[SIM_KEY_FAN_TRAYS] + Sizes[SIM_KEY_SUPPLIES];
-    Resources =
-        static_cast<SimResourceT **>(KVI_CS_MALLOC(ResourceCapacity * sizeof(SimResourceT *)));
+    Resources = static_cast<SimResourceT **>(
+        KVI_CS_MALLOC(ResourceCapacity * (sizeof(SimResourceT *) + sizeof(SaHpiBoolT))));
     if (Resources == nullptr) {
         pthread_mutex_unlock(&Registry);
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Simulator: out of memory");
         return SA_ERR_HPI_OUT_OF_SPACE;
     }
     ResourceCount = 0;
+    Present = reinterpret_cast<SaHpiBoolT *>(Resources + ResourceCapacity);
+    memset(Present, 0, ResourceCapacity * sizeof(SaHpiBoolT));
     Discovered = SAHPI_FALSE;
     SaErrorT rc = startTicker();
     if (rc != SA_OK) {
@@ -470,6 +579,11 @@ SaErrorT simMaplFinalization(void) noexcept
     while (ResourceCount > 0) {
         releaseResource(Resources[--ResourceCount]);
     }
+    while (DepartedList != nullptr) {
+        SimResourceT *departed = DepartedList;
+        DepartedList = departed->NextDeparted;
+        releaseResource(departed);
+    }
     if (Resources != nullptr) {
         KVI_CS_FREE(Resources);
     }
@@ -477,6 +591,9 @@ SaErrorT simMaplFinalization(void) noexcept
     Initialized = SAHPI_FALSE;
     Discovered = SAHPI_FALSE;
     pthread_mutex_unlock(&Registry);
+    pthread_mutex_lock(&ClockMutex);
+    ManualClock = SAHPI_FALSE;
+    pthread_mutex_unlock(&ClockMutex);
     return SA_OK;
 }
 
@@ -495,13 +612,16 @@ SaErrorT simResourcesDiscover(SaHpiDomainIdT DomainId) noexcept
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Simulator: no plug-in lock available");
         return SA_ERR_HPI_ERROR;
     }
-    const SaHpiUint32T counts[SIM_KIND_COUNT] = {1, Sizes[SIM_KEY_BOARDS], Sizes[SIM_KEY_FAN_TRAYS],
-                                                 Sizes[SIM_KEY_SUPPLIES]};
+    pthread_mutex_lock(&Registry);
+    ShelfDomain = DomainId;
+    LockCount = locks;
+    pthread_mutex_unlock(&Registry);
     SaErrorT result = SA_OK;
     SaHpiUint32T added = 0;
     for (SaHpiUint32T kind = 0; kind < SIM_KIND_COUNT; kind++) {
         const SimResourceShapeT *shape = simResourceShape(static_cast<SimKindT>(kind));
-        for (SaHpiUint32T instance = 1; instance <= counts[kind]; instance++) {
+        for (SaHpiUint32T instance = 1; instance <= countOf(static_cast<SimKindT>(kind));
+             instance++) {
             KviCsRwLockT *lock = nullptr;
             SaErrorT rc = kviDsMaplManagerGetMaplLock(MaplNum, added % locks, &lock);
             SimResourceT *resource = nullptr;
@@ -510,6 +630,7 @@ SaErrorT simResourcesDiscover(SaHpiDomainIdT DomainId) noexcept
                 rc = resource == nullptr ? SA_ERR_HPI_OUT_OF_SPACE
                                          : registerResource(DomainId, resource, lock);
             }
+            markPresent(static_cast<SimKindT>(kind), instance, rc == SA_OK);
             if (rc != SA_OK) {
                 KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Simulator: resource %s %u not added. rc=%d",
                          shape->TagFormat, instance, rc);
@@ -547,7 +668,14 @@ SaErrorT simRptEntryResourcesRemove(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRptEn
     if (resource == nullptr) {
         return SA_ERR_HPI_INVALID_PARAMS;
     }
-    if (!unregisterResource(resource)) {
+    pthread_mutex_lock(&Registry);
+    const SaHpiBoolT departed = resource->Departed;
+    const SaHpiBoolT found = !departed && takeOut(resource);
+    pthread_mutex_unlock(&Registry);
+    if (departed) {
+        return SA_OK; // a pulled board stays on the departed chain
+    }
+    if (!found) {
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Simulator: removal of an unknown resource");
         return SA_ERR_HPI_INVALID_PARAMS;
     }
@@ -599,9 +727,29 @@ SaHpiTimeT simNow() noexcept
     return now;
 }
 
-void simWatchdogStarted() noexcept
+void simCountdownStarted() noexcept
 {
     wakeTicker();
+}
+
+SaHpiInt64T simHotSwapNowNs() noexcept
+{
+    pthread_mutex_lock(&ClockMutex);
+    const SaHpiInt64T now = ManualClock ? ManualNowNs : monotonicNs();
+    pthread_mutex_unlock(&ClockMutex);
+    return now;
+}
+
+void simDepartIfDue(SimResourceT *Resource) noexcept
+{
+    SaHpiBoolT due = SAHPI_FALSE;
+    {
+        SimLock lock(Resource);
+        due = Resource->HotSwap.Departing;
+    }
+    if (due) {
+        departResource(Resource);
+    }
 }
 
 void simText(SaHpiTextBufferT *Buffer, const char *Text) noexcept
@@ -615,6 +763,120 @@ void simText(SaHpiTextBufferT *Buffer, const char *Text) noexcept
     }
     memcpy(Buffer->Data, Text, n);
     Buffer->DataLength = static_cast<SaHpiUint8T>(n);
+}
+
+// ---- Pulling and inserting boards, and the hot-swap clock (KviSimulator.h) ----
+
+namespace
+{
+
+// The FRU place an entity path names; Registry held. The chassis is no FRU.
+SaErrorT findFru(const SaHpiEntityPathT *Entity, SimKindT *Kind, SaHpiUint32T *Instance) noexcept
+{
+    if (!Discovered) {
+        return SA_ERR_HPI_NOT_PRESENT;
+    }
+    for (SaHpiUint32T kind = SIM_PROCESSOR_BOARD; kind < SIM_KIND_COUNT; kind++) {
+        const SaHpiUint32T instance = Entity->Entry[0].EntityInstance;
+        if (instance < 1 || instance > countOf(static_cast<SimKindT>(kind))) {
+            continue;
+        }
+        SaHpiEntityPathT path;
+        entityPath(static_cast<SimKindT>(kind), instance, &path);
+        if (memcmp(&path, Entity, sizeof(path)) == 0) {
+            *Kind = static_cast<SimKindT>(kind);
+            *Instance = instance;
+            return SA_OK;
+        }
+    }
+    return SA_ERR_HPI_NOT_PRESENT;
+}
+
+SimResourceT *residentAt(SimKindT Kind, SaHpiUint32T Instance) noexcept
+{
+    for (SaHpiUint32T i = 0; i < ResourceCount; i++) {
+        if (Resources[i]->Shape->Kind == Kind && Resources[i]->Instance == Instance) {
+            return Resources[i];
+        }
+    }
+    return nullptr;
+}
+
+// A board put in an empty place: a new resource, unpowered, registered and
+// then sent into INSERTION_PENDING. The place is the caller's already.
+SaErrorT insertFru(SimKindT Kind, SaHpiUint32T Instance) noexcept
+{
+    KviCsRwLockT *lock = nullptr;
+    SaErrorT rc =
+        kviDsMaplManagerUnprotectedGetMaplLock(MaplNum, placeOf(Kind, Instance) % LockCount, &lock);
+    SimResourceT *resource = nullptr;
+    if (rc == SA_OK) {
+        resource = allocateResource(simResourceShape(Kind), Instance);
+        rc = resource == nullptr ? SA_ERR_HPI_OUT_OF_SPACE : SA_OK;
+    }
+    if (rc == SA_OK) {
+        resource->HotSwap.State = SAHPI_HS_STATE_NOT_PRESENT;
+        resource->PowerState = SAHPI_HS_POWER_OFF;
+        rc = registerResource(ShelfDomain, resource, lock);
+    }
+    if (rc != SA_OK) {
+        markPresent(Kind, Instance, SAHPI_FALSE);
+        return rc;
+    }
+    SimLock hold(resource);
+    simHotSwapInserted(resource);
+    return SA_OK;
+}
+
+} // namespace
+
+extern "C" __attribute__((visibility("default"))) SaErrorT
+kviSimHotSwapDrive(const SaHpiEntityPathT *Entity, SaHpiBoolT Insert) noexcept
+{
+    if (Entity == nullptr || Insert > SAHPI_TRUE) {
+        return SA_ERR_HPI_INVALID_PARAMS;
+    }
+    SimKindT kind = SIM_CHASSIS;
+    SaHpiUint32T instance = 0;
+    pthread_mutex_lock(&Registry);
+    SaErrorT rc = findFru(Entity, &kind, &instance);
+    SimResourceT *resident = nullptr;
+    if (rc == SA_OK) {
+        SaHpiBoolT &present = Present[placeOf(kind, instance)];
+        resident = present ? residentAt(kind, instance) : nullptr;
+        if (present == Insert || (!Insert && resident == nullptr)) {
+            rc = SA_ERR_HPI_INVALID_REQUEST;
+        } else if (Insert) {
+            present = SAHPI_TRUE; // the place is the insertion's from now on
+        }
+    }
+    pthread_mutex_unlock(&Registry);
+    if (rc != SA_OK || Insert) {
+        return rc != SA_OK ? rc : insertFru(kind, instance);
+    }
+    {
+        SimLock lock(resident);
+        rc = simHotSwapPull(resident);
+    }
+    simDepartIfDue(resident);
+    return rc;
+}
+
+extern "C" __attribute__((visibility("default"))) SaErrorT
+kviSimClockAdvance(SaHpiTimeoutT Elapsed) noexcept
+{
+    if (Elapsed < 0) {
+        return SA_ERR_HPI_INVALID_PARAMS;
+    }
+    pthread_mutex_lock(&ClockMutex);
+    if (!ManualClock) {
+        ManualNowNs = monotonicNs();
+        ManualClock = SAHPI_TRUE;
+    }
+    ManualNowNs = Elapsed > INT64_MAX - ManualNowNs ? INT64_MAX : ManualNowNs + Elapsed;
+    pthread_mutex_unlock(&ClockMutex);
+    hotSwapTick();
+    return SA_OK;
 }
 
 // ---- The function tables ----

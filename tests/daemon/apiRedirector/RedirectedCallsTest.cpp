@@ -2,6 +2,7 @@
 // through saHpi* alone, every refusal shape once, the checks of what a client
 // may set at their boundaries, the locks a call takes, and the saves that a
 // successful set leaves behind.
+#include <dlfcn.h>
 #include <gtest/gtest.h>
 
 #include <atomic>
@@ -11,8 +12,11 @@
 
 #include "../../core/SaHpi/rpt/RptTestSupport.h"
 #include "../../plugins/simulator/SimulatorTestSupport.h"
+#include "core/SaHpi/domain/Domain.h"
+#include "core/SaHpi/parmControl/ParmControlHelpers.h"
 #include "core/utils/NonVolatileStorage.h"
 #include "daemon/apiRedirector/ApiRedirector.h"
+#include "plugins/simulator/KviSimulator.h"
 #include "support/KviTestSupport.h"
 
 namespace
@@ -452,6 +456,198 @@ TEST_F(RedirectedCallsTest, EventsArriveWithTheirRecordAndEntryAppended)
     EXPECT_EQ(saHpiSessionClose(session), SA_OK);
     reader.join();
     EXPECT_EQ(saHpiUnsubscribe(session), SA_ERR_HPI_INVALID_SESSION);
+}
+
+// ---- Hot swap on the simulated shelf ----
+
+constexpr SaHpiTimeoutT kSecond = 1000000000LL;
+using Change = std::pair<SaHpiHsStateT, SaHpiHsStateT>; // previous, new
+
+template <typename Fn> Fn simulatorHook(const char *Name)
+{
+    void *handle = dlopen(simulatorPath().c_str(), RTLD_NOW | RTLD_NOLOAD);
+    EXPECT_NE(handle, nullptr);
+    auto fn = reinterpret_cast<Fn>(dlsym(handle, Name));
+    dlclose(handle);
+    return fn;
+}
+
+class HotSwapTest : public RedirectedCallsTest
+{
+  protected:
+    // The shelf of the suite before, or one of its own when run alone.
+    static void SetUpTestSuite()
+    {
+        if (session_ == 0)
+            RedirectedCallsTest::SetUpTestSuite();
+    }
+    void SetUp() override
+    {
+        ASSERT_EQ(saHpiSessionOpen(SAHPI_DEFAULT_DOMAIN_ID, &events_, nullptr), SA_OK);
+        ASSERT_EQ(saHpiSubscribe(events_, SAHPI_FALSE), SA_OK);
+        ASSERT_NE(drive_, nullptr);
+        ASSERT_EQ(advance_(0), SA_OK); // the countdowns move only when the test says
+    }
+    void TearDown() override { saHpiSessionClose(events_); }
+
+    // The hot-swap changes posted since the last call, of any resource.
+    std::vector<Change> changes()
+    {
+        std::vector<Change> seen;
+        SaHpiEventT e{};
+        while (saHpiEventGet(events_, SAHPI_TIMEOUT_IMMEDIATE, &e, nullptr, nullptr) == SA_OK)
+            if (e.EventType == SAHPI_ET_HOTSWAP)
+                seen.emplace_back(e.EventDataUnion.HotSwapEvent.PreviousHotSwapState,
+                                  e.EventDataUnion.HotSwapEvent.HotSwapState);
+        return seen;
+    }
+    SaHpiHsStateT state(SaHpiResourceIdT Rid)
+    {
+        SaHpiHsStateT s{};
+        EXPECT_EQ(saHpiHotSwapStateGet(session_, Rid, &s), SA_OK);
+        return s;
+    }
+
+    SaHpiSessionIdT events_ = 0;
+    KviSimHotSwapDriveT drive_ = simulatorHook<KviSimHotSwapDriveT>(KVI_SIM_HOT_SWAP_DRIVE);
+    KviSimClockAdvanceT advance_ = simulatorHook<KviSimClockAdvanceT>(KVI_SIM_CLOCK_ADVANCE);
+};
+
+// A board pulled and put back, with the policies running on their own, held
+// by a client that took control, and decided by the client.
+TEST_F(HotSwapTest, BoardGoesAndComesBackThroughEveryState)
+{
+    const SaHpiRptEntryT board = resource("Processor");
+    const SaHpiResourceIdT old = board.ResourceId;
+    ASSERT_EQ(state(old), SAHPI_HS_STATE_ACTIVE_HEALTHY);
+    ASSERT_EQ(saHpiAutoExtractTimeoutSet(session_, old, kSecond), SA_OK);
+    ASSERT_EQ(drive_(&board.ResourceEntity, SAHPI_FALSE), SA_OK);
+    ASSERT_EQ(advance_(kSecond - 1), SA_OK);
+    EXPECT_EQ(state(old), SAHPI_HS_STATE_EXTRACTION_PENDING);
+    ASSERT_EQ(advance_(1), SA_OK);
+    SaHpiRptEntryT entry{};
+    EXPECT_EQ(saHpiRptEntryGetByResourceId(session_, old, &entry), SA_ERR_HPI_INVALID_RESOURCE);
+    EXPECT_EQ(changes(), (std::vector<Change>{
+                             {SAHPI_HS_STATE_ACTIVE_HEALTHY, SAHPI_HS_STATE_EXTRACTION_PENDING},
+                             {SAHPI_HS_STATE_EXTRACTION_PENDING, SAHPI_HS_STATE_INACTIVE},
+                             {SAHPI_HS_STATE_INACTIVE, SAHPI_HS_STATE_NOT_PRESENT}}));
+
+    // Inserted under a client that stops the auto-insert countdown.
+    ASSERT_EQ(saHpiAutoInsertTimeoutSet(session_, 2 * kSecond), SA_OK);
+    ASSERT_EQ(drive_(&board.ResourceEntity, SAHPI_TRUE), SA_OK);
+    const SaHpiResourceIdT rid = resource("Processor").ResourceId;
+    EXPECT_NE(rid, old);
+    EXPECT_EQ(state(rid), SAHPI_HS_STATE_INSERTION_PENDING);
+    EXPECT_EQ(saHpiHotSwapControlRequest(session_, rid), SA_OK);
+    ASSERT_EQ(advance_(10 * kSecond), SA_OK);
+    EXPECT_EQ(state(rid), SAHPI_HS_STATE_INSERTION_PENDING);
+    EXPECT_EQ(saHpiResourceActiveSet(session_, rid), SA_OK);
+    SaHpiHsIndicatorStateT led{};
+    EXPECT_EQ(saHpiHotSwapIndicatorStateGet(session_, rid, &led), SA_OK);
+    EXPECT_EQ(led, SAHPI_HS_INDICATOR_OFF);
+
+    // Extractions the client refuses, then accepts; an insertion at once.
+    ASSERT_EQ(saHpiAutoExtractTimeoutSet(session_, rid, SAHPI_TIMEOUT_BLOCK), SA_OK);
+    ASSERT_EQ(saHpiHotSwapActionRequest(session_, rid, SAHPI_HS_ACTION_EXTRACTION), SA_OK);
+    ASSERT_EQ(advance_(100 * kSecond), SA_OK);
+    EXPECT_EQ(saHpiResourceActiveSet(session_, rid), SA_OK);
+    ASSERT_EQ(saHpiHotSwapActionRequest(session_, rid, SAHPI_HS_ACTION_EXTRACTION), SA_OK);
+    EXPECT_EQ(saHpiResourceInactiveSet(session_, rid), SA_OK);
+    EXPECT_EQ(saHpiHotSwapIndicatorStateGet(session_, rid, &led), SA_OK);
+    EXPECT_EQ(led, SAHPI_HS_INDICATOR_ON);
+    ASSERT_EQ(saHpiAutoInsertTimeoutSet(session_, SAHPI_TIMEOUT_IMMEDIATE), SA_OK);
+    ASSERT_EQ(saHpiHotSwapActionRequest(session_, rid, SAHPI_HS_ACTION_INSERTION), SA_OK);
+    EXPECT_EQ(state(rid), SAHPI_HS_STATE_ACTIVE_HEALTHY);
+    EXPECT_EQ(changes(), (std::vector<Change>{
+                             {SAHPI_HS_STATE_NOT_PRESENT, SAHPI_HS_STATE_INSERTION_PENDING},
+                             {SAHPI_HS_STATE_INSERTION_PENDING, SAHPI_HS_STATE_ACTIVE_HEALTHY},
+                             {SAHPI_HS_STATE_ACTIVE_HEALTHY, SAHPI_HS_STATE_EXTRACTION_PENDING},
+                             {SAHPI_HS_STATE_EXTRACTION_PENDING, SAHPI_HS_STATE_ACTIVE_HEALTHY},
+                             {SAHPI_HS_STATE_ACTIVE_HEALTHY, SAHPI_HS_STATE_EXTRACTION_PENDING},
+                             {SAHPI_HS_STATE_EXTRACTION_PENDING, SAHPI_HS_STATE_INACTIVE},
+                             {SAHPI_HS_STATE_INACTIVE, SAHPI_HS_STATE_INSERTION_PENDING},
+                             {SAHPI_HS_STATE_INSERTION_PENDING, SAHPI_HS_STATE_ACTIVE_HEALTHY}}));
+
+    // An inactive board leaves as soon as it is pulled.
+    ASSERT_EQ(saHpiAutoExtractTimeoutSet(session_, rid, SAHPI_TIMEOUT_IMMEDIATE), SA_OK);
+    ASSERT_EQ(drive_(&board.ResourceEntity, SAHPI_FALSE), SA_OK);
+    EXPECT_EQ(saHpiRptEntryGetByResourceId(session_, rid, &entry), SA_ERR_HPI_INVALID_RESOURCE);
+    EXPECT_EQ(changes().back(), Change(SAHPI_HS_STATE_INACTIVE, SAHPI_HS_STATE_NOT_PRESENT));
+    ASSERT_EQ(drive_(&board.ResourceEntity, SAHPI_TRUE), SA_OK);
+    ASSERT_EQ(saHpiAutoInsertTimeoutSet(session_, KVI_CS_DEFAULT_AUTO_INSERT_TIMEOUT), SA_OK);
+}
+
+// One case per refusal: the capability, the state, the arguments, the slot.
+TEST_F(HotSwapTest, RefusalsNameTheirCause)
+{
+    const SaHpiRptEntryT fan = resource("Fan");
+    const SaHpiResourceIdT tray = fan.ResourceId, chassis = resource("Chassis").ResourceId;
+    SaHpiRptEntryT bare = makeRptEntry(SAHPI_CAPABILITY_FRU | SAHPI_CAPABILITY_MANAGED_HOTSWAP);
+    KviDsRptFnTable none{};
+    SaHpiResourceIdT slotless = 0;
+    ASSERT_EQ(
+        kviCsRptEntryAdd(0, bare, nullptr, SAHPI_TRUE, &none, kFakeMapl, &fakeLock_, &slotless),
+        SA_OK);
+    SaHpiHsStateT hs{};
+    // A two-valued enum holds no other value in C++; a C caller passes one
+    // all the same, as these calls through the C signature do.
+    using RawSetT = SaErrorT (*)(SaHpiSessionIdT, SaHpiResourceIdT, SaHpiUint32T);
+    const auto action = reinterpret_cast<RawSetT>(saHpiHotSwapActionRequest);
+    const auto led = reinterpret_cast<RawSetT>(saHpiHotSwapIndicatorStateSet);
+    SaHpiTimeoutT timeout = 0;
+    const SaHpiEntityPathT nowhere{};
+    const struct {
+        const char *what;
+        SaErrorT rc, expected;
+    } cases[] = {
+        {"not a FRU", saHpiHotSwapStateGet(session_, chassis, &hs), SA_ERR_HPI_INVALID_CMD},
+        {"not managed", saHpiHotSwapControlRequest(session_, fake_), SA_ERR_HPI_INVALID_CMD},
+        {"NULL state", saHpiHotSwapStateGet(session_, tray, nullptr), SA_ERR_HPI_INVALID_PARAMS},
+        {"NULL timeout", saHpiAutoInsertTimeoutGet(session_, nullptr), SA_ERR_HPI_INVALID_PARAMS},
+        {"action out of its enum", action(session_, tray, 2), SA_ERR_HPI_INVALID_PARAMS},
+        {"indicator out of its enum", led(session_, tray, 2), SA_ERR_HPI_INVALID_PARAMS},
+        {"negative timeout", saHpiAutoExtractTimeoutSet(session_, tray, -2),
+         SA_ERR_HPI_INVALID_PARAMS},
+        {"negative domain timeout", saHpiAutoInsertTimeoutSet(session_, -2),
+         SA_ERR_HPI_INVALID_PARAMS},
+        {"NULL slot", saHpiAutoExtractTimeoutGet(session_, slotless, &timeout),
+         SA_ERR_HPI_INVALID_CMD},
+        {"control while active", saHpiHotSwapControlRequest(session_, tray),
+         SA_ERR_HPI_INVALID_REQUEST},
+        {"active set while active", saHpiResourceActiveSet(session_, tray),
+         SA_ERR_HPI_INVALID_REQUEST},
+        {"inactive set while active", saHpiResourceInactiveSet(session_, tray),
+         SA_ERR_HPI_INVALID_REQUEST},
+        {"insertion while active",
+         saHpiHotSwapActionRequest(session_, tray, SAHPI_HS_ACTION_INSERTION),
+         SA_ERR_HPI_INVALID_REQUEST},
+        {"drive without a path", drive_(nullptr, SAHPI_TRUE), SA_ERR_HPI_INVALID_PARAMS},
+        {"drive not boolean", drive_(&fan.ResourceEntity, 2), SA_ERR_HPI_INVALID_PARAMS},
+        {"no such place", drive_(&nowhere, SAHPI_FALSE), SA_ERR_HPI_NOT_PRESENT},
+        {"place taken", drive_(&fan.ResourceEntity, SAHPI_TRUE), SA_ERR_HPI_INVALID_REQUEST},
+        {"clock backwards", advance_(-1), SA_ERR_HPI_INVALID_PARAMS},
+    };
+    for (const auto &c : cases) {
+        SCOPED_TRACE(c.what);
+        EXPECT_EQ(c.rc, c.expected);
+    }
+    EXPECT_EQ(kviCsRptEntryRemoveByRid(0, slotless), SA_OK);
+    EXPECT_TRUE(changes().empty());
+}
+
+// The domain's auto-insert timeout survives a restart of the daemon.
+TEST_F(HotSwapTest, AutoInsertTimeoutIsSavedAndRestoredWithTheDomain)
+{
+    ASSERT_EQ(saHpiAutoInsertTimeoutSet(session_, 7 * kSecond), SA_OK);
+    SaHpiTimeoutT saved = 0;
+    EXPECT_EQ(kviCsGetAutoInsertTimeoutNV(0, SAHPI_TRUE, &saved), SA_OK);
+    EXPECT_EQ(saved, 7 * kSecond);
+    ASSERT_EQ(kviCsAutoInsertTimeoutSet(0, KVI_CS_DEFAULT_AUTO_INSERT_TIMEOUT), SA_OK);
+    EXPECT_EQ(kviCsDaemonRestoreDomain(0), SA_OK);
+    SaHpiTimeoutT timeout = 0;
+    EXPECT_EQ(saHpiAutoInsertTimeoutGet(session_, &timeout), SA_OK);
+    EXPECT_EQ(timeout, 7 * kSecond);
+    ASSERT_EQ(saHpiAutoInsertTimeoutSet(session_, KVI_CS_DEFAULT_AUTO_INSERT_TIMEOUT), SA_OK);
 }
 
 // ---- The checks of what a client may set, at their boundaries ----
