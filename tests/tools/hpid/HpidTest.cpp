@@ -200,6 +200,7 @@ TEST_F(HpidTest, AnswersEveryCallAsTheLibraryDoesInProcess)
     SaHpiUint32T schema;
     SaHpiTimeoutT timeout;
     SAME(saHpiEntitySchemaGet, &schema);
+    SAME(saHpiAutoInsertTimeoutSet, SAHPI_TIMEOUT_BLOCK);
     SAME(saHpiAutoInsertTimeoutGet, &timeout);
     int resources = 0;
     for (SaHpiEntryIdT entry = SAHPI_FIRST_ENTRY, next; entry != SAHPI_LAST_ENTRY; entry = next) {
@@ -218,6 +219,16 @@ TEST_F(HpidTest, AnswersEveryCallAsTheLibraryDoesInProcess)
         SAME(saHpiHotSwapStateGet, rid, &hs);
         SAME(saHpiHotSwapIndicatorStateGet, rid, &indicator);
         SAME(saHpiAutoExtractTimeoutGet, rid, &timeout);
+        // The hot-swap state machine, driven alike on both sides; no
+        // countdown runs, so each step waits for its call.
+        SAME(saHpiAutoExtractTimeoutSet, rid, SAHPI_TIMEOUT_BLOCK);
+        SAME(saHpiHotSwapActionRequest, rid, SAHPI_HS_ACTION_EXTRACTION);
+        SAME(saHpiHotSwapStateGet, rid, &hs);
+        SAME(saHpiHotSwapControlRequest, rid);
+        SAME(saHpiHotSwapIndicatorStateSet, rid, SAHPI_HS_INDICATOR_ON);
+        SAME(saHpiResourceActiveSet, rid);
+        SAME(saHpiResourceInactiveSet, rid);
+        SAME(saHpiHotSwapStateGet, rid, &hs);
         SAME(saHpiResourceSeveritySet, rid, SAHPI_MAJOR);
         SAME(saHpiResourceTagSet, rid, &rpt.ResourceTag);
         SAME(saHpiParmControl, rid, SAHPI_SAVE_PARM);

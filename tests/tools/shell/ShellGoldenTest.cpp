@@ -10,6 +10,8 @@
 #include <sstream>
 #include <string>
 
+#include "../hpid/HpidTestSupport.h"
+
 namespace
 {
 
@@ -111,6 +113,29 @@ TEST(ShellGoldenTest, RemoteModeChecksTheServerAndLoadsTheClientLibrary)
               std::string::npos)
         << missing.Output;
     EXPECT_EQ(runShell("--remote h:1 --config x").Status, 2);
+}
+
+TEST(ShellGoldenTest, RemoteModeShowsWhatTheShellHostingTheLibraryShows)
+{
+    // The daemon works from wherever the test runs: its plug-in by full path.
+    const std::string config =
+        std::regex_replace(readFile(configFile()), std::regex("mapl_modules = \"[^\"]*\""),
+                           "mapl_modules = \"" KVI_SHELL_BUILD_DIR "/plugins/libKviSimulator.so\"");
+    const std::string daemonConfig = "/tmp/kvi-shell-test-daemon.conf";
+    std::ofstream(daemonConfig) << std::regex_replace(config, std::regex("kvi-shell-test-nv"),
+                                                      "kvi-shell-test-daemon-nv");
+    ASSERT_EQ(system("rm -rf /tmp/kvi-shell-test-nv /tmp/kvi-shell-test-daemon-nv"), 0);
+    KviHpid daemon(daemonConfig, "/tmp/kvi-shell-test-daemon.log");
+    ASSERT_NE(daemon.port(), 0);
+    const std::string commands =
+        " -e resources -e 'resource 2' -e 'sensor read 2 1' -e 'inventory 2 5' -e 'hotswap state 2'";
+    RunT local = runShell("--config " + configFile() + commands);
+    RunT remote = runShell("--remote 127.0.0.1:" + std::to_string(daemon.port()) + commands,
+                           "KVI_HPI_CLIENT_LIB=" KVI_HPI_CLIENT_PATH);
+    EXPECT_EQ(local.Status, 0) << local.Output;
+    EXPECT_EQ(remote.Status, 0) << remote.Output;
+    EXPECT_EQ(remote.Output, local.Output);
+    EXPECT_EQ(daemon.stop(SIGTERM), 0);
 }
 
 } // namespace
