@@ -18,8 +18,9 @@ constexpr size_t PTR = sizeof(void *);
 constexpr size_t GENERAL_TEXTS = (CUSTOM - offsetof(SaHpiInventGeneralDataT, Manufacturer)) / PTR;
 
 // Where a record's general area starts within the record, or 0 for a record
-// whose data are DataLength opaque bytes.
-size_t generalOffset(SaHpiInventDataRecordTypeT Type) noexcept
+// whose data are DataLength opaque bytes. The type is taken as the number it
+// is on the wire, which need not be one of the enumeration's.
+size_t generalOffset(SaHpiUint32T Type) noexcept
 {
     switch (Type) {
     case SAHPI_INVENT_RECTYPE_CHASSIS_INFO:
@@ -32,9 +33,10 @@ size_t generalOffset(SaHpiInventDataRecordTypeT Type) noexcept
     }
 }
 
-SaHpiInventDataRecordTypeT recordType(const void *Record) noexcept
+SaHpiUint32T recordType(const void *Record) noexcept
 {
-    SaHpiInventDataRecordTypeT type;
+    static_assert(sizeof(SaHpiInventDataRecordTypeT) == sizeof(SaHpiUint32T));
+    SaHpiUint32T type;
     memcpy(&type, static_cast<const char *>(Record) + offsetof(SaHpiInventDataRecordT, RecordType),
            sizeof type);
     return type;
@@ -73,7 +75,7 @@ class Flattener
         if (!ok_) {
             return rc_;
         }
-        memcpy(block_ + at, Data, RECORDS);
+        copy(at, Data, RECORDS);
         for (size_t i = 0; i < count; ++i) {
             link(at + RECORDS + i * PTR,
                  record(static_cast<const char *>(*slot(Data, RECORDS, i))));
@@ -110,7 +112,9 @@ class Flattener
             fail(SA_ERR_HPI_OUT_OF_SPACE);
             return 0;
         }
-        memset(block_ + at, 0, Bytes);
+        if (block_ != nullptr) {
+            memset(block_ + at, 0, Bytes);
+        }
         used_ = at + Bytes;
         return at;
     }
@@ -123,10 +127,18 @@ class Flattener
         }
     }
 
+    // Without a block the walk only checks and measures.
+    void copy(size_t At, const void *From, size_t Bytes) noexcept
+    {
+        if (ok_ && block_ != nullptr) {
+            memcpy(block_ + At, From, Bytes);
+        }
+    }
+
     // Writes the wire form of a pointer: the target's offset plus one.
     void link(size_t Slot, size_t Target) noexcept
     {
-        if (ok_) {
+        if (ok_ && block_ != nullptr) {
             uintptr_t v = Target;
             memcpy(block_ + Slot, &v, sizeof v);
         }
@@ -148,6 +160,12 @@ class Flattener
                 ++customs;
             }
         }
+        // A length past anything a message holds cannot be right, and must
+        // not wrap the sum on a 32-bit machine.
+        if (general == 0 && length > 0xffff) {
+            fail(SA_ERR_HPI_INVALID_DATA);
+            return 0;
+        }
         const size_t bytes =
             general != 0 ? general + CUSTOM + (customs + 1) * PTR : RECORD_DATA + length;
         if (!ok_ || !inside(Record, bytes)) {
@@ -159,7 +177,7 @@ class Flattener
         if (!ok_) {
             return 0;
         }
-        memcpy(block_ + at, Record, bytes);
+        copy(at, Record, bytes);
         for (size_t i = 0; general != 0 && i < GENERAL_TEXTS + customs; ++i) {
             link(at + general + offsetof(SaHpiInventGeneralDataT, Manufacturer) + i * PTR,
                  text(static_cast<const SaHpiTextBufferT *>(*textSlot(Record + general, i))));
@@ -173,9 +191,7 @@ class Flattener
             return 0;
         }
         const size_t at = take(sizeof *Text, alignof(SaHpiTextBufferT));
-        if (ok_) {
-            memcpy(block_ + at, Text, sizeof *Text);
-        }
+        copy(at, Text, sizeof *Text);
         return ok_ ? at + 1 : 0;
     }
 
@@ -256,7 +272,7 @@ class Relocator
         if (general == 0) {
             SaHpiUint32T length;
             memcpy(&length, Record + offsetof(SaHpiInventDataRecordT, DataLength), sizeof length);
-            return fits(at, RECORD_DATA + size_t(length));
+            return length <= size_ && fits(at, RECORD_DATA + size_t(length));
         }
         if (!fits(at, general + CUSTOM)) {
             return false;
@@ -292,5 +308,14 @@ SaErrorT kviWireInventoryFlatten(const SaHpiInventoryDataT *Data, const void *Bo
 
 SaErrorT kviWireInventoryRelocate(void *Block, SaHpiUint32T Size) noexcept
 {
-    return Relocator(static_cast<char *>(Block), Size).head() ? SA_OK : SA_ERR_HPI_INVALID_DATA;
+    if (!Relocator(static_cast<char *>(Block), Size).head()) {
+        return SA_ERR_HPI_INVALID_DATA;
+    }
+    // Objects may overlap the pointers turned before them, so what was
+    // checked on the way may have changed: the finished tree is walked again,
+    // reading only, and must keep to the block.
+    Flattener check(Block, Size, nullptr, SIZE_MAX);
+    return check.head(static_cast<const SaHpiInventoryDataT *>(Block)) == SA_OK
+               ? SA_OK
+               : SA_ERR_HPI_INVALID_DATA;
 }
