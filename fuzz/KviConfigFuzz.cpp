@@ -8,17 +8,36 @@ using namespace kviFuzz;
 
 namespace
 {
+// The first place in [from, end) where `length` bytes start with `first` and
+// satisfy `matches`, or null. memchr rather than memmem: the sanitizer checks
+// the whole rest of the text on every memmem call, which made the check of an
+// input with many pairs quadratic; memchr is checked only as far as it read.
+template <typename Match>
+const char *findFirst(const char *from, const char *end, size_t length, char first, Match matches)
+{
+    for (const char *p = from; end - p >= static_cast<ptrdiff_t>(length); ++p) {
+        p = static_cast<const char *>(memchr(p, first, static_cast<size_t>(end - p)));
+        if (p == nullptr || end - p < static_cast<ptrdiff_t>(length))
+            return nullptr;
+        if (matches(p))
+            return p;
+    }
+    return nullptr;
+}
+
+// The first `value` in [from, end), or null.
+const char *find(const char *from, const char *end, const char *value, size_t length)
+{
+    return findFirst(from, end, length, value[0],
+                     [&](const char *p) { return memcmp(p, value, length) == 0; });
+}
+
 // The first `"value"` (quotes included) in [from, end), or null.
 const char *findQuoted(const char *from, const char *end, const char *value, size_t length)
 {
-    for (const char *q = from; end - q >= static_cast<ptrdiff_t>(length + 2); ++q) {
-        q = static_cast<const char *>(memchr(q, '"', static_cast<size_t>(end - q)));
-        if (q == nullptr || end - q < static_cast<ptrdiff_t>(length + 2))
-            return nullptr;
-        if (memcmp(q + 1, value, length) == 0 && q[length + 1] == '"')
-            return q;
-    }
-    return nullptr;
+    return findFirst(from, end, length + 2, '"', [&](const char *q) {
+        return memcmp(q + 1, value, length) == 0 && q[length + 1] == '"';
+    });
 }
 
 // Each pair's key and quoted value must occur after the previous pair, before
@@ -33,8 +52,7 @@ const char *checkPair(const KviKeyValuePairT *pair, const char *cursor, const ch
     require(valueLength < MAX_VALUE_LENGTH);
     require(strspn(pair->Key, KV_VALID_CHARACTERS) == keyLength);
 
-    auto *key = static_cast<const char *>(
-        memmem(cursor, static_cast<size_t>(end - cursor), pair->Key, keyLength));
+    const char *key = find(cursor, end, pair->Key, keyLength);
     require(key != nullptr);
     const char *quoted = findQuoted(key + keyLength, end, pair->Value, valueLength);
     require(quoted != nullptr);
