@@ -39,6 +39,7 @@ struct Client {
     std::string Server;
     SaHpiInt32T Port = DEFAULT_PORT;
     SaHpiInt32T CallTimeout = DEFAULT_CALL_TIMEOUT_MS;
+    bool LogOpened = false;
 };
 
 Client client;
@@ -172,6 +173,7 @@ SaErrorT kviClientInitialize() noexcept
     const char *log = getenv("KVI_LIB_LOG_LOCATION");
     if (log != nullptr && *log != '\0') {
         kviCsLogInitHelper(log, getenv("KVI_LIB_LOG_LEVEL"));
+        client.LogOpened = true;
     }
     client.Initialized = true;
     return SA_OK;
@@ -185,6 +187,10 @@ SaErrorT kviClientFinalize() noexcept
     }
     client.Initialized = false;
     dropIdle();
+    if (client.LogOpened) {
+        kviCsLogClose();
+        client.LogOpened = false;
+    }
     return SA_OK;
 }
 

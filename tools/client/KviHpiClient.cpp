@@ -76,7 +76,8 @@ KviWireBody responseBody() noexcept
 template <KviMsgTypeT Code, typename... A>
 SaErrorT callWithin(SaHpiInt32T TimeoutMs, A... Args) noexcept
 {
-    static_assert(std::is_same_v<decltype(Call<Code>::Function), SaErrorT (*const)(A...) noexcept>);
+    static_assert(
+        std::is_same_v<decltype(kviWireRawFn(Call<Code>::Function)), SaErrorT (*)(A...) noexcept>);
     KviWireBody request = startRequest(Code);
     if (!kviWirePutCall<Call<Code>::Dirs>(request, Args...)) {
         return request.ok() ? SA_ERR_HPI_INVALID_PARAMS : SA_ERR_HPI_ERROR;
@@ -236,7 +237,7 @@ KVI_CLIENT_API SaErrorT saHpiResourceSeveritySet(SaHpiSessionIdT SessionId,
                                                  SaHpiResourceIdT ResourceId,
                                                  SaHpiSeverityT Severity) noexcept
 {
-    return call<KVI_RESOURCE_SEVERITY_SET_REQ>(SessionId, ResourceId, Severity);
+    return call<KVI_RESOURCE_SEVERITY_SET_REQ>(SessionId, ResourceId, kviWireRaw(Severity));
 }
 
 KVI_CLIENT_API SaErrorT saHpiResourceTagSet(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId,
@@ -500,7 +501,7 @@ KVI_CLIENT_API SaErrorT saHpiHotSwapActionRequest(SaHpiSessionIdT SessionId,
                                                   SaHpiResourceIdT ResourceId,
                                                   SaHpiHsActionT Action) noexcept
 {
-    return call<KVI_HOTSWAP_ACTION_REQUEST_REQ>(SessionId, ResourceId, Action);
+    return call<KVI_HOTSWAP_ACTION_REQUEST_REQ>(SessionId, ResourceId, kviWireRaw(Action));
 }
 
 KVI_CLIENT_API SaErrorT saHpiResourcePowerStateGet(SaHpiSessionIdT SessionId,
@@ -514,7 +515,7 @@ KVI_CLIENT_API SaErrorT saHpiResourcePowerStateSet(SaHpiSessionIdT SessionId,
                                                    SaHpiResourceIdT ResourceId,
                                                    SaHpiHsPowerStateT State) noexcept
 {
-    return call<KVI_RESOURCE_POWER_STATE_SET_REQ>(SessionId, ResourceId, State);
+    return call<KVI_RESOURCE_POWER_STATE_SET_REQ>(SessionId, ResourceId, kviWireRaw(State));
 }
 
 KVI_CLIENT_API SaErrorT saHpiHotSwapIndicatorStateGet(SaHpiSessionIdT SessionId,
@@ -528,13 +529,13 @@ KVI_CLIENT_API SaErrorT saHpiHotSwapIndicatorStateSet(SaHpiSessionIdT SessionId,
                                                       SaHpiResourceIdT ResourceId,
                                                       SaHpiHsIndicatorStateT State) noexcept
 {
-    return call<KVI_HOTSWAP_INDICATOR_STATE_SET_REQ>(SessionId, ResourceId, State);
+    return call<KVI_HOTSWAP_INDICATOR_STATE_SET_REQ>(SessionId, ResourceId, kviWireRaw(State));
 }
 
 KVI_CLIENT_API SaErrorT saHpiParmControl(SaHpiSessionIdT SessionId, SaHpiResourceIdT ResourceId,
                                          SaHpiParmActionT Action) noexcept
 {
-    return call<KVI_PARM_CONTROL_REQ>(SessionId, ResourceId, Action);
+    return call<KVI_PARM_CONTROL_REQ>(SessionId, ResourceId, kviWireRaw(Action));
 }
 
 KVI_CLIENT_API SaErrorT saHpiResourceResetStateGet(SaHpiSessionIdT SessionId,
@@ -548,5 +549,5 @@ KVI_CLIENT_API SaErrorT saHpiResourceResetStateSet(SaHpiSessionIdT SessionId,
                                                    SaHpiResourceIdT ResourceId,
                                                    SaHpiResetActionT ResetAction) noexcept
 {
-    return call<KVI_RESOURCE_RESET_STATE_SET_REQ>(SessionId, ResourceId, ResetAction);
+    return call<KVI_RESOURCE_RESET_STATE_SET_REQ>(SessionId, ResourceId, kviWireRaw(ResetAction));
 }

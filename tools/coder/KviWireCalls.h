@@ -24,6 +24,7 @@
 #define KVI_WIRE_CALLS_H
 
 #include <stddef.h>
+#include <string.h>
 
 #include <tuple>
 #include <type_traits>
@@ -129,6 +130,34 @@ using KviWireSlotT =
                                           std::remove_const_t<std::remove_pointer_t<A>>>,
                        A>;
 
+/* An enumeration passed by value travels, and is held, as the number it is:
+ * a C caller or a peer may pass any number, the call refuses what is not
+ * one of the enumeration's values, and only C lets such a number be the
+ * enumeration. So C++ here never reads one as the enumeration: it copies the
+ * caller's bytes (kviWireRaw) and calls through the C signature with the
+ * enumeration's underlying type (kviWireRawFn), which is the same ABI. */
+template <typename A> struct KviWireRawOf {
+    using Type = A;
+};
+template <typename A>
+requires std::is_enum_v<A>
+struct KviWireRawOf<A> {
+    using Type = std::underlying_type_t<A>;
+};
+template <typename A> using KviWireRawT = typename KviWireRawOf<A>::Type;
+
+template <typename T> KviWireRawT<T> kviWireRaw(const T &Value) noexcept
+{
+    KviWireRawT<T> raw;
+    memcpy(&raw, &Value, sizeof raw);
+    return raw;
+}
+
+template <typename... A> auto kviWireRawFn(SaErrorT (*Fn)(A...) noexcept) noexcept
+{
+    return reinterpret_cast<SaErrorT (*)(KviWireRawT<A>...) noexcept>(Fn);
+}
+
 /* Sends the request's part of one parameter (client side). */
 template <char L, typename A> bool kviWirePutParam(KviWireBody &Body, A Arg) noexcept
 {
@@ -163,7 +192,7 @@ template <char L, typename A> void kviWireGetParam(KviWireBody &Body, A Arg, boo
 /* The daemon's side of one parameter: taken from the request, handed to
  * the call, and sent back when it is a result. */
 template <char L, typename A> struct KviWireServerParam {
-    KviWireSlotT<A> Slot{};
+    KviWireSlotT<KviWireRawT<A>> Slot{};
     bool Wanted = false;
 
     void get(KviWireBody &Body) noexcept
@@ -176,7 +205,7 @@ template <char L, typename A> struct KviWireServerParam {
             Wanted = wanted != SAHPI_FALSE;
         }
     }
-    A arg() noexcept
+    KviWireRawT<A> arg() noexcept
     {
         if constexpr (L == 'z') {
             return nullptr;
@@ -212,7 +241,7 @@ bool kviWireServe(KviWireBody &In, KviWireBody &Out, SaErrorT *Result) noexcept
         if (!In.finished()) {
             return false;
         }
-        *Result = Fn(std::get<I>(params).arg()...);
+        *Result = kviWireRawFn(Fn)(std::get<I>(params).arg()...);
         (std::get<I>(params).put(Out), ...);
         return Out.ok();
     }

@@ -21,4 +21,18 @@ void kviHpidServeConnection(SaHpiInt32T Desc) noexcept;
 // request came on, -1 when none.
 void kviHpidServeMessage(SaHpiInt32T Desc, void *Request, void *Response) noexcept;
 
+// The calls that take an enumeration by value, called with the number the
+// client sent (KviHpidEnums.c).
+#define KVI_HPID_ENUM_CALLS(X)                                                                     \
+    X(kviHpidResourceSeveritySet, saHpiResourceSeveritySet)                                        \
+    X(kviHpidHotSwapActionRequest, saHpiHotSwapActionRequest)                                      \
+    X(kviHpidResourcePowerStateSet, saHpiResourcePowerStateSet)                                    \
+    X(kviHpidHotSwapIndicatorStateSet, saHpiHotSwapIndicatorStateSet)                              \
+    X(kviHpidParmControl, saHpiParmControl)                                                        \
+    X(kviHpidResourceResetStateSet, saHpiResourceResetStateSet)
+#define KVI_HPID_ENUM_DECLARE(Name, Call)                                                          \
+    extern "C" SaErrorT Name(SaHpiSessionIdT, SaHpiResourceIdT, unsigned int) noexcept;
+KVI_HPID_ENUM_CALLS(KVI_HPID_ENUM_DECLARE)
+#undef KVI_HPID_ENUM_DECLARE
+
 #endif

@@ -66,6 +66,11 @@ SaErrorT eventGet(SaHpiSessionIdT SessionId, SaHpiTimeoutT Timeout, SaHpiEventT 
 template <auto Fn> constexpr auto served = Fn;
 template <> constexpr auto served<saHpiSessionOpen> = sessionOpen;
 template <> constexpr auto served<saHpiEventGet> = eventGet;
+#define KVI_HPID_ENUM_SERVED(Name, Call)                                                           \
+    static_assert(std::is_same_v<decltype(&Name), decltype(kviWireRawFn(&Call))>);                 \
+    template <> constexpr auto served<Call> = Name;
+KVI_HPID_ENUM_CALLS(KVI_HPID_ENUM_SERVED)
+#undef KVI_HPID_ENUM_SERVED
 
 using Handler = bool (*)(KviWireBody &In, KviWireBody &Out, SaErrorT *Result);
 

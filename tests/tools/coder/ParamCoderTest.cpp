@@ -48,10 +48,17 @@ struct Message {
 };
 Message request, response;
 
+template <typename T> struct RawArgs;
+template <typename... A> struct RawArgs<std::tuple<A...>> {
+    using Type = std::tuple<KviWireRawT<A>...>;
+};
+
 template <KviMsgTypeT Code, auto Fn, KviWireDirs D> void roundTrip(const char *Name)
 {
     SCOPED_TRACE(Name);
-    using Args = typename KviWireFn<decltype(Fn)>::Args;
+    // Enumerations are held as their numbers, as the coder holds them: the
+    // byte pattern is no value of theirs.
+    using Args = typename RawArgs<typename KviWireFn<decltype(Fn)>::Args>::Type;
     [&]<size_t... I>(std::index_sequence<I...>)
     {
         std::tuple<KviWireSlotT<std::tuple_element_t<I, Args>>...> slots;

@@ -7,6 +7,7 @@
 #include <poll.h>
 #include <signal.h>
 #include <stdio.h>
+#include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -36,6 +37,9 @@ class KviHpid
             return;
         pid_ = fork();
         if (pid_ == 0) {
+            // A test that dies must not leave its daemon holding the output
+            // that the test runner waits on.
+            prctl(PR_SET_PDEATHSIG, SIGKILL);
             dup2(out[1], 1);
             close(out[0]);
             const std::string port = std::to_string(Port);
