@@ -21,38 +21,6 @@
 namespace
 {
 
-// The way the daemon runs it: the configuration names the plug-in,
-// saHpiInitialize loads it, a client's discovery fills the tables (a second
-// pass adds nothing), and saHpiFinalize unloads it again, stopping its
-// countdown thread. The exit status tells which step failed.
-TEST(SimulatorDeathTest, DaemonLoadsDiscoversAndUnloadsTheShelf)
-{
-    KviTempDir dir;
-    const std::string config = dir.write(
-        "daemon.conf", "mapl_modules = \"" + simulatorPath() + "\"\nKviNvStorageDir = \"" +
-                           dir.file("nv") + "\"\nKviSimProcessorBoards = \"3\"\n");
-    auto child = [&] {
-        SaHpiVersionT version = 0;
-        SaHpiSessionIdT session = 0;
-        if (kviCsConfigInit(SAHPI_FALSE, config.c_str()) != SA_OK ||
-            kviDsApiRedirectorInitialize() != SA_OK || saHpiInitialize(&version) != SA_OK ||
-            saHpiSessionOpen(SAHPI_DEFAULT_DOMAIN_ID, &session, nullptr) != SA_OK)
-            return 10;
-        for (int pass = 0; pass < 2; pass++)
-            if (saHpiResourcesDiscover(session) != SA_OK || walkShelf().ByTag.size() != 6)
-                return 11 + pass;
-        if (walkShelf().ByTag["Processor board 3"].Records.size() != 6)
-            return 13;
-        if (saHpiFinalize() != SA_OK)
-            return 14;
-        SaHpiEntryIdT next = 0;
-        SaHpiRptEntryT entry{};
-        SaErrorT rc = kviCsRptActiveEntryGet(DOMAIN, SAHPI_FIRST_ENTRY, &next, &entry, nullptr);
-        return rc == SA_ERR_HPI_NOT_PRESENT ? 0 : 15;
-    };
-    EXPECT_EXIT(exit(child()), testing::ExitedWithCode(0), "");
-}
-
 using Str = const std::string &;
 const std::string CHASSIS = "Chassis 1", BOARD1 = "Processor board 1", BOARD2 = "Processor board 2",
                   TRAY = "Fan tray 1", PSU = "Power supply 1";
@@ -275,6 +243,8 @@ TEST_F(SimulatorTest, ShelfIsSizedByItsKeysAndSpreadOverThePluginsLocks)
     // A chassis, two boards, one fan tray (three fans) and one supply: ids 1
     // to 5, walked by id modulo 5.
     EXPECT_EQ(shelf_.Order, (std::vector<SaHpiResourceIdT>{5, 1, 2, 3, 4}));
+    ASSERT_EQ(kviDsMaplManagerDiscoverResources(DOMAIN), SA_OK);
+    EXPECT_EQ(walkShelf().Order, shelf_.Order) << "a second discovery adds nothing";
     const SaHpiCapabilitiesT common = SAHPI_CAPABILITY_RESOURCE | SAHPI_CAPABILITY_RDR |
                                       SAHPI_CAPABILITY_SENSOR | SAHPI_CAPABILITY_CONTROL |
                                       SAHPI_CAPABILITY_INVENTORY_DATA | SAHPI_CAPABILITY_SEL |
@@ -928,23 +898,8 @@ TEST_F(SimulatorTest, ResourceDefaultsPutTheLogStateAndHotSwapSettingsBack)
     EXPECT_EQ(r.Fn.RptDefaultParmControl(DOMAIN, 999), SA_ERR_HPI_INVALID_RESOURCE);
 }
 
-TEST_F(SimulatorTest, RecordParametersAreDefaultedSavedAndRestored)
+TEST_F(SimulatorTest, SensorDefaultsPutTheThresholdsBack)
 {
-    // Saving and restoring a control go through the library's store.
-    const std::string id = "Display brightness";
-    Record &r = rec(CHASSIS, id);
-    SaHpiRdrT rdr = r.Rdr;
-    KviDsRdrFnTable fn = r.Fn;
-    ASSERT_EQ(setControl(CHASSIS, id, ctrlState(SAHPI_CTRL_TYPE_ANALOG, 10)), SA_OK);
-    ASSERT_EQ(r.Fn.RdrSaveParmControl(DOMAIN, rid(CHASSIS), &rdr, &fn, r.UserData), SA_OK);
-    ASSERT_EQ(setControl(CHASSIS, id, ctrlState(SAHPI_CTRL_TYPE_ANALOG, 90)), SA_OK);
-    ASSERT_EQ(r.Fn.RdrRestoreParmControl(DOMAIN, rid(CHASSIS), SAHPI_FALSE, &rdr, &fn, r.UserData),
-              SA_OK);
-    EXPECT_EQ(control(CHASSIS, id).StateUnion.Analog, 10);
-    ASSERT_EQ(r.Fn.RdrDefaultParmControl(DOMAIN, rid(CHASSIS), &rdr, &fn, r.UserData), SA_OK);
-    EXPECT_EQ(control(CHASSIS, id).StateUnion.Analog, 75);
-
-    // A sensor's default puts its thresholds back.
     Record &cpu = rec(BOARD2, "CPU temperature");
     SaHpiSensorThresholdsT t{};
     t.UpMinor = rawReading(50);
@@ -952,28 +907,6 @@ TEST_F(SimulatorTest, RecordParametersAreDefaultedSavedAndRestored)
     ASSERT_EQ(cpu.Fn.RdrDefaultParmControl(DOMAIN, 0, nullptr, nullptr, cpu.UserData), SA_OK);
     EXPECT_EQ(thresholds(BOARD2, "CPU temperature").UpMinor.Raw, 70u);
 }
-
-// ---- The example configuration ----
-
-#ifdef KVI_SIMULATOR_EXAMPLE
-TEST(SimulatorExampleTest, ExampleConfigurationNamesTheBuiltSimulatorAndSizesTheShelf)
-{
-    KviCsCfgContainer config{};
-    ASSERT_EQ(kviCsConfigInitStructure(&config, SAHPI_FALSE, KVI_SIMULATOR_EXAMPLE), SA_OK);
-    char modules[2048] = "", dir[300] = "";
-    ASSERT_EQ(kviCsCfgDataGet("mapl_modules", sizeof(modules), modules, &config), SA_OK);
-    // Relative to the build directory, which is where the demo starts the daemon.
-    EXPECT_EQ(std::string(KVI_SIMULATOR_BUILD_DIR) + "/" + modules, simulatorPath());
-    for (const char *key : {"KviSimProcessorBoards", "KviSimFanTrays", "KviSimFans",
-                            "KviSimPowerSupplies", "KviSimEventLogSize", "KviMaxNvObjects"}) {
-        SaHpiUint32T value = 0;
-        EXPECT_EQ(kviCsCfgDataUint32Get(key, &value, &config), SA_OK) << key;
-        EXPECT_GT(value, 0u) << key;
-    }
-    EXPECT_EQ(kviCsCfgDataGet("KviNvStorageDir", sizeof(dir), dir, &config), SA_OK);
-    EXPECT_EQ(kviCsConfigFinalizeStrucure(&config), SA_OK);
-}
-#endif
 
 // ---- Unloading (last: it loads the shelf again under new ids) ----
 

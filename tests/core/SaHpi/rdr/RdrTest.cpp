@@ -1,4 +1,3 @@
-#include <map>
 #include <string>
 
 #include "core/SaHpi/rpt/RptTestSupport.h"
@@ -274,32 +273,6 @@ TEST_F(RdrTest, HashSizeAppliesToRepositoriesMadeAfterIt)
     for (int i = 0; i < 8; i++)
         addRdr(rid_, SAHPI_SENSOR_RDR);
     EXPECT_EQ(walk(), (Ids{7, 1, 8, 2, 3, 4, 5, 6}));
-}
-
-// Cleanup calls per user pointer.
-std::map<void *, int> cleanups;
-
-SaErrorT countCleanup(SaHpiDomainIdT, SaHpiResourceIdT, SaHpiRdrT *Rdr, void *UserData,
-                      KviDsRdrFnTable *FnTable)
-{
-    EXPECT_EQ(FnTable->RdrResourcesRemove, &countCleanup);
-    EXPECT_EQ(*static_cast<SaHpiEntryIdT *>(UserData), Rdr->RecordId);
-    cleanups[UserData]++;
-    return SA_OK;
-}
-
-TEST_F(RdrTest, RemovingAResourceCallsEachRecordsCleanupOnce)
-{
-    cleanups.clear();
-    KviDsRdrFnTable counting{};
-    counting.RdrResourcesRemove = countCleanup;
-    SaHpiEntryIdT ids[7] = {1, 2, 3, 4, 5, 6, 7};
-    for (SaHpiEntryIdT &id : ids)
-        addRdr(rid_, SAHPI_SENSOR_RDR, id % 3 == 0 ? KviDsRdrFnTable{} : counting, &id);
-    ASSERT_EQ(kviCsRptEntryRemoveByRid(0, rid_), SA_OK);
-    EXPECT_EQ(cleanups.size(), 5u);
-    for (auto &[user, calls] : cleanups)
-        EXPECT_EQ(calls, 1) << *static_cast<SaHpiEntryIdT *>(user);
 }
 
 TEST_F(RdrTest, FailedAllocationsLeaveTheRepositoryAsItWasAndSpendTheId)
