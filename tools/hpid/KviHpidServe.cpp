@@ -78,16 +78,26 @@ struct AlignedBlock {
     alignas(KVI_WIRE_INVENTORY_ALIGN) SaHpiUint8T Bytes[KVI_WIRE_MAX_MSG];
 };
 
+// What both inventory requests start with; Size is the caller's buffer for a
+// read and the size of the data that follows for a write.
+struct InventoryRequest {
+    SaHpiSessionIdT Session = 0;
+    SaHpiResourceIdT Resource = 0;
+    SaHpiEirIdT Eir = 0;
+    SaHpiUint32T Size = 0;
+
+    explicit InventoryRequest(KviWireBody &In) noexcept
+    {
+        In.get(Session);
+        In.get(Resource);
+        In.get(Eir);
+        In.get(Size);
+    }
+};
+
 bool inventoryRead(KviWireBody &In, KviWireBody &Out, SaErrorT *Result)
 {
-    SaHpiSessionIdT session = 0;
-    SaHpiResourceIdT resource = 0;
-    SaHpiEirIdT eir = 0;
-    SaHpiUint32T bufferSize = 0;
-    In.get(session);
-    In.get(resource);
-    In.get(eir);
-    In.get(bufferSize);
+    const InventoryRequest r(In);
     if (!In.finished()) {
         return false;
     }
@@ -96,15 +106,14 @@ bool inventoryRead(KviWireBody &In, KviWireBody &Out, SaErrorT *Result)
     std::vector<AlignedBlock> blocks(2);
     SaHpiUint32T actual = 0;
     SaHpiUint32T used = 0;
-    const SaHpiUint32T size =
-        bufferSize < KVI_WIRE_INVENTORY_MAX ? bufferSize : KVI_WIRE_INVENTORY_MAX;
+    const SaHpiUint32T size = r.Size < KVI_WIRE_INVENTORY_MAX ? r.Size : KVI_WIRE_INVENTORY_MAX;
     auto *tree = reinterpret_cast<SaHpiInventoryDataT *>(blocks[0].Bytes);
-    *Result = saHpiEntityInventoryDataRead(session, resource, eir, size, tree, &actual);
+    *Result = saHpiEntityInventoryDataRead(r.Session, r.Resource, r.Eir, size, tree, &actual);
     if ((*Result == SA_OK || *Result == SA_ERR_HPI_DATA_LEN_INVALID) &&
         size >= sizeof(SaHpiInventoryDataT) &&
         kviWireInventoryFlatten(tree, tree, size, blocks[1].Bytes, size, &used) != SA_OK) {
         KVI_ELOG(KVI_LOG_ERR_NONFATAL, "Inventory of resource %u does not keep to its buffer",
-                 resource);
+                 r.Resource);
         *Result = SA_ERR_HPI_ERROR;
         used = 0;
     }
@@ -116,22 +125,15 @@ bool inventoryRead(KviWireBody &In, KviWireBody &Out, SaErrorT *Result)
 
 bool inventoryWrite(KviWireBody &In, KviWireBody &Out, SaErrorT *Result)
 {
-    SaHpiSessionIdT session = 0;
-    SaHpiResourceIdT resource = 0;
-    SaHpiEirIdT eir = 0;
-    SaHpiUint32T used = 0;
-    In.get(session);
-    In.get(resource);
-    In.get(eir);
-    In.get(used);
+    const InventoryRequest r(In);
     std::vector<AlignedBlock> block(1);
-    In.get(block[0].Bytes, used);
-    if (!In.finished() || used > sizeof block[0].Bytes ||
-        kviWireInventoryRelocate(block[0].Bytes, used) != SA_OK) {
+    In.get(block[0].Bytes, r.Size);
+    if (!In.finished() || r.Size > sizeof block[0].Bytes ||
+        kviWireInventoryRelocate(block[0].Bytes, r.Size) != SA_OK) {
         return false;
     }
     *Result = saHpiEntityInventoryDataWrite(
-        session, resource, eir, reinterpret_cast<SaHpiInventoryDataT *>(block[0].Bytes));
+        r.Session, r.Resource, r.Eir, reinterpret_cast<SaHpiInventoryDataT *>(block[0].Bytes));
     return true;
 }
 
