@@ -135,6 +135,13 @@ int startLibrary(const Options &O)
         return fail("saHpiSessionOpen", rc);
     }
     rc = saHpiResourcesDiscover(session);
+    // An empty domain is most often a plug-in that did not load.
+    SaHpiEntryIdT next;
+    SaHpiRptEntryT first;
+    if (rc == SA_OK && saHpiRptEntryGet(session, SAHPI_FIRST_ENTRY, &next, &first) != SA_OK) {
+        fprintf(stderr, "%s: no resources; check \"mapl_modules\" in %s\n", PROGRAM,
+                O.Config.c_str());
+    }
     saHpiSessionClose(session);
     if (rc != SA_OK) {
         return fail("saHpiResourcesDiscover", rc);

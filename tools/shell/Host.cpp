@@ -86,6 +86,12 @@ bool kviShellStart(KviShellT &Shell, const char *Remote)
                        HPI(saHpiSessionOpen, SAHPI_DEFAULT_DOMAIN_ID, &Shell.Session, nullptr)) ||
         !kviShellDiscover(Shell))
         return false;
+    // An empty domain is most often a plug-in that did not load.
+    SaHpiEntryIdT next;
+    SaHpiRptEntryT first;
+    if (HPI(saHpiRptEntryGet, Shell.Session, SAHPI_FIRST_ENTRY, &next, &first) != SA_OK)
+        fprintf(stderr, "kvi-hpi-shell: no resources; check \"mapl_modules\" in the configuration "
+                        "(a relative path is taken from the current directory)\n");
     if (Remote == nullptr) {
         // As a daemon does at start: put back what clients saved before.
         SaErrorT rc = kviCsDaemonRestoreDomain(SAHPI_DEFAULT_DOMAIN_ID);
