@@ -8,18 +8,7 @@
  *   z  not sent: the daemon passes NULL (the reserved SecurityParams)
  * The two inventory calls, whose data is a tree of pointers, are coded by
  * hand (KviInventoryWire.h) and are not in this table.
- *
- * The hot-swap calls and the two power-state calls take the thirteen codes
- * that lie between KVI_WATCHDOG_TIMER_RESET_RSP and KVI_PARM_CONTROL_REQ, in
- * the order of their prototypes in SaHpi.h:
- *   0x0052 saHpiHotSwapControlRequest     0x0060 saHpiHotSwapStateGet
- *   0x0054 saHpiResourceActiveSet         0x0062 saHpiHotSwapActionRequest
- *   0x0056 saHpiResourceInactiveSet       0x0064 saHpiResourcePowerStateGet
- *   0x0058 saHpiAutoInsertTimeoutGet      0x0066 saHpiResourcePowerStateSet
- *   0x005a saHpiAutoInsertTimeoutSet      0x0068 saHpiHotSwapIndicatorStateGet
- *   0x005c saHpiAutoExtractTimeoutGet     0x006a saHpiHotSwapIndicatorStateSet
- *   0x005e saHpiAutoExtractTimeoutSet
- * each with its response one above. */
+ */
 #ifndef KVI_WIRE_CALLS_H
 #define KVI_WIRE_CALLS_H
 
@@ -31,22 +20,6 @@
 #include <utility>
 
 #include "KviParamCoder.h"
-
-enum : KviMsgTypeT {
-    KVI_HOTSWAP_CONTROL_REQUEST_REQ = 0x0052,
-    KVI_RESOURCE_ACTIVE_SET_REQ = 0x0054,
-    KVI_RESOURCE_INACTIVE_SET_REQ = 0x0056,
-    KVI_AUTO_INSERT_TIMEOUT_GET_REQ = 0x0058,
-    KVI_AUTO_INSERT_TIMEOUT_SET_REQ = 0x005a,
-    KVI_AUTO_EXTRACT_TIMEOUT_GET_REQ = 0x005c,
-    KVI_AUTO_EXTRACT_TIMEOUT_SET_REQ = 0x005e,
-    KVI_HOTSWAP_STATE_GET_REQ = 0x0060,
-    KVI_HOTSWAP_ACTION_REQUEST_REQ = 0x0062,
-    KVI_RESOURCE_POWER_STATE_GET_REQ = 0x0064,
-    KVI_RESOURCE_POWER_STATE_SET_REQ = 0x0066,
-    KVI_HOTSWAP_INDICATOR_STATE_GET_REQ = 0x0068,
-    KVI_HOTSWAP_INDICATOR_STATE_SET_REQ = 0x006a
-};
 
 /* X(request code, function, parameter letters) for every call with a
  * generic body. */
