@@ -23,13 +23,24 @@ std::string readFile(const std::string &Path)
     return text.str();
 }
 
+// Files of this run of the test, so that runs side by side keep apart.
+std::string scratch(const std::string &Name)
+{
+    return "/tmp/kvi-shell-test-" + std::to_string(getpid()) + "-" + Name;
+}
+
+struct ScratchCleanup : testing::Environment {
+    void TearDown() override { EXPECT_EQ(system(("rm -rf " + scratch("*")).c_str()), 0); }
+};
+const auto *scratchCleanup = testing::AddGlobalTestEnvironment(new ScratchCleanup);
+
 // The example configuration with a store of the test's own.
 std::string configFile()
 {
     std::string config =
         std::regex_replace(readFile(KVI_SHELL_EXAMPLE), std::regex("KviNvStorageDir = \"[^\"]*\""),
-                           "KviNvStorageDir = \"/tmp/kvi-shell-test-nv\"");
-    std::string path = "/tmp/kvi-shell-test.conf";
+                           "KviNvStorageDir = \"" + scratch("nv") + "\"");
+    std::string path = scratch("conf");
     std::ofstream(path) << config;
     return path;
 }
@@ -62,7 +73,7 @@ std::string masked(const std::string &Output)
 
 TEST(ShellGoldenTest, ScriptOnTheSimulatorPrintsTheGoldenTables)
 {
-    ASSERT_EQ(system("rm -rf /tmp/kvi-shell-test-nv"), 0);
+    ASSERT_EQ(system(("rm -rf " + scratch("nv")).c_str()), 0);
     std::string dir = KVI_SHELL_TEST_DIR;
     RunT run = runShell("--config " + configFile() + " " + dir + "/tour.hsh");
     EXPECT_EQ(run.Status, 0) << run.Output;
@@ -121,14 +132,14 @@ TEST(ShellGoldenTest, RemoteModeShowsWhatTheShellHostingTheLibraryShows)
     const std::string config =
         std::regex_replace(readFile(configFile()), std::regex("mapl_modules = \"[^\"]*\""),
                            "mapl_modules = \"" KVI_SHELL_BUILD_DIR "/plugins/libKviSimulator.so\"");
-    const std::string daemonConfig = "/tmp/kvi-shell-test-daemon.conf";
-    std::ofstream(daemonConfig) << std::regex_replace(config, std::regex("kvi-shell-test-nv"),
-                                                      "kvi-shell-test-daemon-nv");
-    ASSERT_EQ(system("rm -rf /tmp/kvi-shell-test-nv /tmp/kvi-shell-test-daemon-nv"), 0);
-    KviHpid daemon(daemonConfig, "/tmp/kvi-shell-test-daemon.log");
+    const std::string daemonConfig = scratch("daemon.conf");
+    std::ofstream(daemonConfig) << std::regex_replace(config, std::regex(scratch("nv")),
+                                                      scratch("daemon-nv"));
+    ASSERT_EQ(system(("rm -rf " + scratch("nv") + " " + scratch("daemon-nv")).c_str()), 0);
+    KviHpid daemon(daemonConfig, scratch("daemon.log"));
     ASSERT_NE(daemon.port(), 0);
-    const std::string commands =
-        " -e resources -e 'resource 2' -e 'sensor read 2 1' -e 'inventory 2 5' -e 'hotswap state 2'";
+    const std::string commands = " -e resources -e 'resource 2' -e 'sensor read 2 1' -e 'inventory "
+                                 "2 5' -e 'hotswap state 2'";
     RunT local = runShell("--config " + configFile() + commands);
     RunT remote = runShell("--remote 127.0.0.1:" + std::to_string(daemon.port()) + commands,
                            "KVI_HPI_CLIENT_LIB=" KVI_HPI_CLIENT_PATH);
